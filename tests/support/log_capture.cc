@@ -1,0 +1,66 @@
+#include "support/log_capture.h"
+
+#include <cstdlib>
+#include <filesystem>
+#include <fstream>
+#include <sstream>
+#include <stdexcept>
+#include <unistd.h>
+
+namespace tvxtest {
+
+LogCapture::LogCapture() { Tvx_SetLogSink(&LogCapture::Sink, this); }
+LogCapture::~LogCapture() { Tvx_SetLogSink(nullptr, nullptr); }
+
+void LogCapture::Sink(TvxLogLevel, const char *text, void *ctx) {
+  static_cast<LogCapture *>(ctx)->lines_.emplace_back(text);
+}
+
+std::string LogCapture::All() const {
+  std::string all;
+  for (const auto &l : lines_) all += l;
+  return all;
+}
+
+bool LogCapture::Contains(const std::string &text) const {
+  for (const auto &l : lines_) {
+    if (l.find(text) != std::string::npos) return true;
+  }
+  return false;
+}
+
+static std::string Env(const char *name, const char *fallback) {
+  const char *v = std::getenv(name);
+  return v != nullptr ? v : fallback;
+}
+
+std::string SourceDir() { return Env("TVX_SOURCE_DIR", "."); }
+std::string MediaDir() { return Env("TVX_MEDIA_DIR", "test-media"); }
+std::string ToolPath() { return Env("TVX_TOOL", "tvxguest"); }
+
+TempDir::TempDir() {
+  std::string tmpl = (std::filesystem::temp_directory_path() / "tvxtest-XXXXXX").string();
+  if (mkdtemp(tmpl.data()) == nullptr) throw std::runtime_error("mkdtemp failed");
+  path_ = tmpl;
+}
+
+TempDir::~TempDir() {
+  std::error_code ec;
+  std::filesystem::remove_all(path_, ec);
+}
+
+std::string ReadFileOrDie(const std::string &path) {
+  std::ifstream in(path, std::ios::binary);
+  if (!in) throw std::runtime_error("cannot read " + path);
+  std::ostringstream ss;
+  ss << in.rdbuf();
+  return ss.str();
+}
+
+void WriteFileOrDie(const std::string &path, const std::string &content) {
+  std::ofstream out(path, std::ios::binary | std::ios::trunc);
+  if (!out) throw std::runtime_error("cannot write " + path);
+  out << content;
+}
+
+}  // namespace tvxtest
