@@ -1,0 +1,2 @@
+# The commands the tool offers.
+"$tool" --help | sed -n '/^Commands:/,/^$/p'
