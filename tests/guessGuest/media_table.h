@@ -1,0 +1,79 @@
+// Runs rows of expected recognition results through Guess_Guest on the
+// mastered test media, and opens a medium for calling one recogniser by
+// itself.
+#pragma once
+
+#include <cstdint>
+#include <cstring>
+#include <string>
+
+#include <gtest/gtest.h>
+
+#include "support/log_capture.h"
+#include "tvx_guess.h"
+#include "tvx_iso9660.h"
+
+namespace tvxtest {
+
+// One mastered image and what Guess_Guest must make of it. A null guestOS
+// means "not recognised" (result 1); versionText may still be expected then.
+struct GuessRow {
+  const char *image;  // below $TVX_MEDIA_DIR, without ".iso"
+  const char *guestOS;
+  uint32_t version = GUESS_VERSION_UNKNOWN;
+  bool noIsolinux = false;
+  const char *versionText = "";
+  const char *override = nullptr;
+};
+
+inline std::string MediaPath(const std::string &image) {
+  return MediaDir() + "/" + image + ".iso";
+}
+
+inline void ExpectGuess(const GuessRow &row) {
+  SCOPED_TRACE(row.image);
+  GuessResult r;
+  std::memset(&r, 0x5a, sizeof r);  // Guess_Guest clears it first
+  int rc = Guess_Guest(MediaPath(row.image).c_str(), nullptr, &r);
+  ASSERT_NE(rc, 2) << "the image did not open";
+  EXPECT_EQ(rc, row.guestOS != nullptr ? 0 : 1);
+  EXPECT_STREQ(r.guestOS, row.guestOS);
+  EXPECT_STREQ(r.guestOSOverride, row.override);
+  EXPECT_EQ(r.version, row.version) << Guess_GetSubString(static_cast<GuessVersion>(r.version));
+  EXPECT_EQ(r.noIsolinuxConfig != 0, row.noIsolinux);
+  EXPECT_STREQ(r.versionText, row.versionText);
+  // Every one of these media passes the fourth recogniser, which writes the
+  // default language into any result it does not recognise.
+  EXPECT_STREQ(r.language, "en-US");
+  EXPECT_STREQ(r.languageShort, "en-US");
+  EXPECT_STREQ(r.languages, "");
+  EXPECT_STREQ(r.editions, "");
+  EXPECT_STREQ(r.displayName, "");
+}
+
+// An ISO 9660 image opened the way Guess_Guest opens it, for calling one
+// recogniser directly.
+class OpenedMedium {
+ public:
+  explicit OpenedMedium(const std::string &image) : path_(MediaPath(image)) {
+    medium_.kind = GUESS_MEDIUM_ISO9660;
+    medium_.path = path_.data();
+    uint32_t formats = 0;
+    Iso9660_ListFormats(path_.c_str(), &formats);
+    if (Iso9660_Open(path_.c_str(), formats, &medium_.isoImage) != 0) medium_.isoImage = nullptr;
+  }
+  ~OpenedMedium() {
+    if (medium_.isoImage != nullptr) Iso9660_Close(medium_.isoImage);
+  }
+  OpenedMedium(const OpenedMedium &) = delete;
+  OpenedMedium &operator=(const OpenedMedium &) = delete;
+
+  bool ok() const { return medium_.isoImage != nullptr; }
+  GuessMedium *get() { return &medium_; }
+
+ private:
+  std::string path_;
+  GuessMedium medium_{};
+};
+
+}  // namespace tvxtest
