@@ -8,7 +8,7 @@
 #include <cstdint>
 #include <cstring>
 
-#include "lib/guessGuest/guess_text.h"
+#include "lib/guessGuest/guess_internal.h"
 #include "tvx_guess.h"
 
 namespace {
@@ -34,9 +34,9 @@ constexpr FreeBsdRow kReleases[] = {
     {"FreeBSD 11.", {nullptr, "freeBSD11", "freeBSD11-64", nullptr}},
 };
 
-tvxguess::UniqueText ReadKernel(GuessMedium *medium, uint64_t *size) {
+tvx::guess::Text ReadKernel(GuessMedium *medium, uint64_t *size) {
   for (const char *path : kKernelPaths) {
-    tvxguess::UniqueText kernel(Guess_ReadFileName(medium, path, size));
+    tvx::guess::Text kernel = tvx::guess::ReadText(medium, path, size);
     if (kernel) return kernel;
   }
   return nullptr;
@@ -44,11 +44,11 @@ tvxguess::UniqueText ReadKernel(GuessMedium *medium, uint64_t *size) {
 
 // The release row that the first line of RELNOTES.TXT names, or null.
 const FreeBsdRow *ReleaseRow(GuessMedium *medium) {
-  tvxguess::UniqueText notes(Guess_ReadFileName(medium, "RELNOTES.TXT", nullptr));
+  tvx::guess::Text notes = tvx::guess::ReadText(medium, "RELNOTES.TXT");
   if (!notes) return nullptr;
   if (char *lineEnd = std::strchr(notes.get(), '\n')) *lineEnd = '\0';
   for (const FreeBsdRow &row : kReleases) {
-    if (tvxguess::Contains(notes.get(), row.release)) return &row;
+    if (tvx::guess::Contains(notes.get(), row.release)) return &row;
   }
   return nullptr;
 }
@@ -75,7 +75,7 @@ const char *NetWareId(const char *name) {
 
 extern "C" TVX_EXPORT Bool Guess_FreeBSD(GuessMedium *medium, GuessResult *result) {
   uint64_t size = 0;
-  tvxguess::UniqueText kernel = ReadKernel(medium, &size);
+  tvx::guess::Text kernel = ReadKernel(medium, &size);
   if (!kernel) return FALSE;
   GuessElfArch arch = Guess_ELF_Arch(kernel.get(), static_cast<size_t>(size));
   kernel.reset();
@@ -93,15 +93,12 @@ extern "C" TVX_EXPORT Bool Guess_FreeBSD(GuessMedium *medium, GuessResult *resul
 }
 
 extern "C" TVX_EXPORT Bool Guess_NetWare(GuessMedium *medium, GuessResult *result) {
-  GuessDir *root = Guess_OpenDir(medium, "/");
-  if (root == nullptr) return FALSE;
   const char *id = nullptr;
-  for (const char *name; id == nullptr && (name = Guess_ReadDir(medium, root)) != nullptr;) {
-    id = NetWareId(name);
+  {
+    tvx::guess::Dir root(medium, "/");
+    if (!root) return FALSE;
+    for (const char *name; id == nullptr && (name = root.Next()) != nullptr;) id = NetWareId(name);
   }
-  Guess_CloseDir(medium, root);
-  if (id == nullptr) return tvxguess::NotRecognised(result);
-  result->guestOS = id;
-  result->version = GUESS_VERSION_UNKNOWN;
-  return TRUE;
+  if (id == nullptr) return tvx::guess::NotRecognised(result);
+  return tvx::guess::Recognised(result, id, GUESS_VERSION_UNKNOWN);
 }

@@ -9,16 +9,17 @@
 // unattended installer keys its answer files on.
 #include <cstdint>
 
-#include "lib/guessGuest/guess_text.h"
+#include "lib/guessGuest/guess_internal.h"
 #include "platform/str.h"
 #include "platform/util.h"
 #include "tvx_guess.h"
 
 namespace {
 
-using tvxguess::BeginsWith;
-using tvxguess::Contains;
-using tvxguess::UniqueText;
+using tvx::guess::Contains;
+using tvx::guess::NotRecognised;
+using tvx::guess::StartsWith;
+using tvx::guess::Text;
 
 struct DebianRow {
   const char *prefix;
@@ -84,36 +85,34 @@ uint32_t DesktopClass(const char *v, Bool *noIsolinux) {
 }
 
 Bool Recognised(GuessResult *result, const char *guestOS, uint32_t version, Bool noIsolinux) {
-  result->guestOS = guestOS;
-  result->version = version;
   result->noIsolinuxConfig = noIsolinux;
-  return TRUE;
+  return tvx::guess::Recognised(result, guestOS, version);
 }
 
 }  // namespace
 
 extern "C" TVX_EXPORT Bool Guess_Debian(GuessMedium *medium, GuessResult *result) {
-  UniqueText info(Guess_ReadFileName(medium, ".disk/info", nullptr));
-  if (!info) return tvxguess::NotRecognised(result);
+  Text info = tvx::guess::ReadText(medium, ".disk/info");
+  if (!info) return NotRecognised(result);
   const char *text = info.get();
   Bool noIsolinux = Guess_FileExists(medium, "isolinux", "isolinux.cfg") ? FALSE : TRUE;
 
   for (const DebianRow &row : kDebianRows) {
-    if (!BeginsWith(text, row.prefix)) continue;
+    if (!StartsWith(text, row.prefix)) continue;
     const char *id = ByArchitecture(text, row.amd64, row.i386, row.arm64);
-    if (id == nullptr) return tvxguess::NotRecognised(result);
+    if (id == nullptr) return NotRecognised(result);
     return Recognised(result, id, GUESS_VERSION_UNKNOWN, noIsolinux);
   }
 
   bool ubuntu = false;
-  for (const char *prefix : kUbuntuPrefixes) ubuntu = ubuntu || BeginsWith(text, prefix);
-  if (!ubuntu) return tvxguess::NotRecognised(result);
+  for (const char *prefix : kUbuntuPrefixes) ubuntu = ubuntu || StartsWith(text, prefix);
+  if (!ubuntu) return NotRecognised(result);
 
   const char *id = ByArchitecture(text, "ubuntu-64", "ubuntu", "arm-ubuntu-64");
   uint32_t version = GUESS_VERSION_UBUNTU_704_OR_LOWER;
   unsigned int index = 0;
-  UniqueText first(StrUtil_GetNextToken(&index, text, " "));
-  UniqueText word(first ? StrUtil_GetNextToken(&index, text, " ") : nullptr);
+  Text first(StrUtil_GetNextToken(&index, text, " "));
+  Text word(first ? StrUtil_GetNextToken(&index, text, " ") : nullptr);
   if (word) {
     const char *v = word.get();
     const char *prefix = "";
@@ -127,6 +126,6 @@ extern "C" TVX_EXPORT Bool Guess_Debian(GuessMedium *medium, GuessResult *result
     // behind on a medium that ends up not recognised.
     Str_Snprintf(result->versionText, sizeof result->versionText, "%s%s", prefix, v);
   }
-  if (id == nullptr) return tvxguess::NotRecognised(result);
+  if (id == nullptr) return NotRecognised(result);
   return Recognised(result, id, version, noIsolinux);
 }

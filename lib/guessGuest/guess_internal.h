@@ -161,3 +161,24 @@ Bool OpenMedium(const char *path, GuessMedium *medium);
 void CloseMedium(GuessMedium *medium);
 
 }  // namespace tvx::guess
+
+namespace tvx::guess {
+
+// StartsWithCaseless ignores ASCII letter case over the prefix's length
+// (the rule of StrUtil_CaselessStartsWith and strncasecmp).
+inline bool StartsWithCaseless(std::string_view text, std::string_view prefix) {
+  if (text.size() < prefix.size()) return false;
+  auto lower = [](char c) { return c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c; };
+  for (size_t i = 0; i < prefix.size(); i++) {
+    if (lower(text[i]) != lower(prefix[i])) return false;
+  }
+  return true;
+}
+
+// DirExists opens and closes a directory of the medium (with its case
+// variants, as Guess_OpenDir tries them).
+inline bool DirExists(GuessMedium *medium, const char *path) {
+  return static_cast<bool>(Dir(medium, path));
+}
+
+}  // namespace tvx::guess

@@ -1,6 +1,6 @@
 // Mac OS X install media. Not part of Guess_Guest's sequence: hosts that
 // offer Mac OS X guests probe their media with it themselves.
-#include "lib/guessGuest/guess_text.h"
+#include "lib/guessGuest/guess_internal.h"
 #include "tvx_guess.h"
 
 namespace {

@@ -9,7 +9,7 @@
 #include <cstdint>
 #include <cstring>
 
-#include "lib/guessGuest/guess_text.h"
+#include "lib/guessGuest/guess_internal.h"
 #include "platform/str.h"
 #include "platform/util.h"
 #include "tvx_guess.h"
@@ -17,9 +17,9 @@
 
 namespace {
 
-using tvxguess::BeginsWith;
-using tvxguess::Contains;
-using tvxguess::UniqueText;
+using tvx::guess::StartsWith;
+using tvx::guess::Contains;
+using tvx::guess::Text;
 
 const char *ByArchitecture(const char *text) {
   if (Contains(text, "x86_64")) return "mandriva-64";
@@ -30,21 +30,21 @@ const char *ByArchitecture(const char *text) {
 Bool FromVersionFile(const char *text, GuessResult *result) {
   // Media of this generation are taken to boot with isolinux, unprobed.
   result->noIsolinuxConfig = FALSE;
-  if (BeginsWith(text, "Mandrake")) {
+  if (StartsWith(text, "Mandrake")) {
     result->guestOS = "mandrake";
     result->version = GUESS_VERSION_UNKNOWN;
     return TRUE;
   }
-  if (!BeginsWith(text, "Mandriva")) return tvxguess::NotRecognised(result);
+  if (!StartsWith(text, "Mandriva")) return tvx::guess::NotRecognised(result);
 
   const char *id = ByArchitecture(text);
   if (Contains(text, " 2006.")) {
-    Str_Strcpy(result->versionText, "2006", sizeof result->versionText);
+    tvx::guess::CopyField(result->versionText, "2006");
     result->version = GUESS_VERSION_MANDRIVA_2006;
   } else {
     result->version = GUESS_VERSION_UNKNOWN;
   }
-  if (id == nullptr) return tvxguess::NotRecognised(result);
+  if (id == nullptr) return tvx::guess::NotRecognised(result);
   result->guestOS = id;
   return TRUE;
 }
@@ -62,11 +62,11 @@ bool HasIsolinuxConfig(GuessMedium *medium) {
 // and the identifier.
 bool FromVolumeId(GuessMedium *medium, const char **id, uint32_t *version) {
   if (medium->kind != GUESS_MEDIUM_ISO9660 || medium->isoImage == nullptr) return false;
-  UniqueText volumeId(Iso9660_GetVolumeId(medium->isoImage));
-  if (!volumeId || !BeginsWith(volumeId.get(), "Mandriva.")) return false;
+  Text volumeId(Iso9660_GetVolumeId(medium->isoImage));
+  if (!volumeId || !StartsWith(volumeId.get(), "Mandriva.")) return false;
   const char *release = volumeId.get() + std::strlen("Mandriva.");
   *id = ByArchitecture(release);
-  if (BeginsWith(release, "201") && std::strlen(volumeId.get()) > 13 && volumeId.get()[13] == '.') {
+  if (StartsWith(release, "201") && std::strlen(volumeId.get()) > 13 && volumeId.get()[13] == '.') {
     *version = GUESS_VERSION_MANDRIVA_2008_1_OR_HIGHER;
     return *id != nullptr;
   }
@@ -74,26 +74,26 @@ bool FromVolumeId(GuessMedium *medium, const char **id, uint32_t *version) {
 }
 
 void FromProductId(const char *text, GuessResult *result, const char **id, uint32_t *version) {
-  if (!BeginsWith(text, "vendor=Mandriva")) return;
+  if (!StartsWith(text, "vendor=Mandriva")) return;
   const char *arch = std::strstr(text, "arch=");
   if (arch == nullptr) return;
   arch += std::strlen("arch=");
-  if (BeginsWith(arch, "x86_6")) {
+  if (StartsWith(arch, "x86_6")) {
     *id = "mandriva-64";
-  } else if (BeginsWith(arch, "i586")) {
+  } else if (StartsWith(arch, "i586")) {
     *id = "mandriva";
   }
 
   const char *field = std::strstr(text, "version=");
   if (field == nullptr) return;
   unsigned int index = static_cast<unsigned int>(std::strlen("version="));
-  UniqueText word(StrUtil_GetNextToken(&index, field, " ,\n"));
+  Text word(StrUtil_GetNextToken(&index, field, " ,\n"));
   if (!word) return;
   const char *v = word.get();
-  Str_Strcpy(result->versionText, v, sizeof result->versionText);
-  if (BeginsWith(v, "2007.")) {
+  tvx::guess::CopyField(result->versionText, v);
+  if (StartsWith(v, "2007.")) {
     *version = GUESS_VERSION_MANDRIVA_2007;
-  } else if (BeginsWith(v, "2008.0")) {
+  } else if (StartsWith(v, "2008.0")) {
     *version = GUESS_VERSION_MANDRIVA_2008_0;
   } else if (Util_CompareDotted(v, "2008.1") >= 0) {
     *version = GUESS_VERSION_MANDRIVA_2008_1_OR_HIGHER;
@@ -105,11 +105,11 @@ Bool WithoutVersionFile(GuessMedium *medium, GuessResult *result) {
   const char *id = nullptr;
   uint32_t version = GUESS_VERSION_UNKNOWN;
   if (!FromVolumeId(medium, &id, &version)) {
-    UniqueText productId(Guess_ReadFileName(medium, "i586/product.id", nullptr));
-    if (!productId) productId.reset(Guess_ReadFileName(medium, "x86_64/product.id", nullptr));
+    Text productId = tvx::guess::ReadText(medium, "i586/product.id");
+    if (!productId) productId = tvx::guess::ReadText(medium, "x86_64/product.id");
     if (productId) FromProductId(productId.get(), result, &id, &version);
   }
-  if (id == nullptr) return tvxguess::NotRecognised(result);
+  if (id == nullptr) return tvx::guess::NotRecognised(result);
   result->guestOS = id;
   result->version = version;
   result->noIsolinuxConfig = noIsolinux;
@@ -119,7 +119,7 @@ Bool WithoutVersionFile(GuessMedium *medium, GuessResult *result) {
 }  // namespace
 
 extern "C" TVX_EXPORT Bool Guess_Mandriva(GuessMedium *medium, GuessResult *result) {
-  UniqueText versionFile(Guess_ReadFileName(medium, "VERSION", nullptr));
+  Text versionFile = tvx::guess::ReadText(medium, "VERSION");
   if (versionFile) return FromVersionFile(versionFile.get(), result);
   return WithoutVersionFile(medium, result);
 }

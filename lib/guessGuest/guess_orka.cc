@@ -14,14 +14,14 @@
 #include <optional>
 #include <string>
 
-#include "lib/guessGuest/guess_text.h"
+#include "lib/guessGuest/guess_internal.h"
 #include "tvx_guess.h"
 
 namespace {
 
-using tvxguess::BeginsWithCaseless;
-using tvxguess::Contains;
-using tvxguess::UniqueText;
+using tvx::guess::StartsWithCaseless;
+using tvx::guess::Contains;
+using tvx::guess::Text;
 
 struct XmlDocDeleter {
   void operator()(xmlDoc *doc) const noexcept { xmlFreeDoc(doc); }
@@ -62,8 +62,8 @@ bool IsOrkaBuild(const char *text) {
     if (Named(child, "name")) name = ElementText(child);
     if (Named(child, "orka_version")) version = ElementText(child);
   }
-  return name && version && BeginsWithCaseless(name->c_str(), "Tarvex Orka") &&
-         BeginsWithCaseless(version->c_str(), "4.");
+  return name && version && StartsWithCaseless(name->c_str(), "Tarvex Orka") &&
+         StartsWithCaseless(version->c_str(), "4.");
 }
 
 struct MenuRow {
@@ -95,22 +95,22 @@ const char *Release7(GuessMedium *medium, const char *config) {
 }  // namespace
 
 extern "C" TVX_EXPORT Bool Guess_Orka(GuessMedium *medium, GuessResult *result) {
-  UniqueText packages(Guess_ReadFileName(medium, "packages.xml", nullptr));
-  if (!packages) return tvxguess::NotRecognised(result);
+  Text packages = tvx::guess::ReadText(medium, "packages.xml");
+  if (!packages) return tvx::guess::NotRecognised(result);
   bool orka = false;
   try {
     orka = IsOrkaBuild(packages.get());
   } catch (const std::exception &) {
     orka = false;  // allocation failure while copying element texts
   }
-  if (!orka) return tvxguess::NotRecognised(result);
+  if (!orka) return tvx::guess::NotRecognised(result);
   result->guestOS = "zelcore";
   result->version = GUESS_VERSION_UNKNOWN;
   return TRUE;
 }
 
 extern "C" TVX_EXPORT Bool Guess_Orkai(GuessMedium *medium, GuessResult *result) {
-  UniqueText config(Guess_ReadFileName(medium, "isolinux.cfg", nullptr));
+  Text config = tvx::guess::ReadText(medium, "isolinux.cfg");
   if (!config) return FALSE;
   const char *id = nullptr;
   for (const MenuRow &row : kMenuRows) {

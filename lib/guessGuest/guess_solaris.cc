@@ -3,7 +3,7 @@
 // ".image_info" instead.
 #include <strings.h>
 
-#include "lib/guessGuest/guess_text.h"
+#include "lib/guessGuest/guess_internal.h"
 #include "tvx_guess.h"
 
 namespace {
@@ -35,16 +35,16 @@ enum class ImageInfo { kUnknown, kAbsent, kNamesSolaris11, kOther };
 // asking once keeps a root of many entries from costing one scan each.
 ImageInfo ProbeImageInfo(GuessMedium *medium) {
   if (!Guess_FileExists(medium, "", ".image_info")) return ImageInfo::kAbsent;
-  tvxguess::UniqueText text(Guess_ReadFileName(medium, ".image_info", nullptr));
-  return text && tvxguess::Contains(text.get(), "Oracle Solaris 11") ? ImageInfo::kNamesSolaris11
+  tvx::guess::Text text = tvx::guess::ReadText(medium, ".image_info");
+  return text && tvx::guess::Contains(text.get(), "Oracle Solaris 11") ? ImageInfo::kNamesSolaris11
                                                                      : ImageInfo::kOther;
 }
 
 // Entries in listing order: a release directory names its row; any other
 // entry defers to ".image_info" when there is one.
-const SolarisRow *Decide(GuessMedium *medium, GuessDir *root) {
+const SolarisRow *Decide(GuessMedium *medium, tvx::guess::Dir *root) {
   ImageInfo info = ImageInfo::kUnknown;
-  for (const char *name; (name = Guess_ReadDir(medium, root)) != nullptr;) {
+  for (const char *name; (name = root->Next()) != nullptr;) {
     if (const SolarisRow *row = RowOf(name)) return row;
     if (info == ImageInfo::kUnknown) info = ProbeImageInfo(medium);
     if (info == ImageInfo::kNamesSolaris11) return &kSolaris11;
@@ -56,13 +56,13 @@ const SolarisRow *Decide(GuessMedium *medium, GuessDir *root) {
 }  // namespace
 
 extern "C" TVX_EXPORT Bool Guess_Solaris(GuessMedium *medium, GuessResult *result) {
-  GuessDir *root = Guess_OpenDir(medium, "/");
-  if (root == nullptr) return FALSE;
-  const SolarisRow *row = Decide(medium, root);
-  Guess_CloseDir(medium, root);
+  const SolarisRow *row = nullptr;
+  {
+    tvx::guess::Dir root(medium, "/");
+    if (!root) return FALSE;
+    row = Decide(medium, &root);
+  }
   if (row == nullptr) return FALSE;
-  result->guestOS = row->guestOS;
   result->guestOSOverride = row->override;
-  result->version = GUESS_VERSION_UNKNOWN;
-  return TRUE;
+  return tvx::guess::Recognised(result, row->guestOS, GUESS_VERSION_UNKNOWN);
 }

@@ -16,16 +16,16 @@
 #include <optional>
 #include <string>
 
-#include "lib/guessGuest/guess_text.h"
+#include "lib/guessGuest/guess_internal.h"
 #include "platform/str.h"
 #include "tvx_guess.h"
 
 namespace {
 
-using tvxguess::BeginsWith;
-using tvxguess::BeginsWithCaseless;
-using tvxguess::Contains;
-using tvxguess::UniqueText;
+using tvx::guess::StartsWith;
+using tvx::guess::StartsWithCaseless;
+using tvx::guess::Contains;
+using tvx::guess::Text;
 
 // What a walk over "content" has gathered. The first PRODUCT/NAME and the
 // first DEFAULTBASE/BASEARCHS win; VERSION and REPOID lines overwrite the
@@ -86,19 +86,19 @@ void ReadContentLine(const std::string &line, ContentFacts *facts) {
   const char *key = line.c_str() + keyStart;
   unsigned int index = static_cast<unsigned int>(keyEnd);
 
-  if (BeginsWith(key, "REPOID")) {
-    UniqueText value(StrUtil_GetNextToken(&index, line.c_str(), " "));
+  if (StartsWith(key, "REPOID")) {
+    Text value(StrUtil_GetNextToken(&index, line.c_str(), " "));
     if (value) ReadRepoId(value.get(), facts);
-  } else if (BeginsWith(key, "PRODUCT") || BeginsWith(key, "NAME")) {
+  } else if (StartsWith(key, "PRODUCT") || StartsWith(key, "NAME")) {
     if (!facts->product) facts->product = line.substr(SkipBlanks(line, keyEnd));
-  } else if (BeginsWith(key, "VERSION")) {
+  } else if (StartsWith(key, "VERSION")) {
     index = SkipBlanks(line, keyEnd);
     int32_t number = 0;
     if (StrUtil_GetNextIntToken(&number, &index, line.c_str(), ".")) facts->major = number;
     if (StrUtil_GetNextIntToken(&number, &index, line.c_str(), ".")) facts->minor = number;
-  } else if (BeginsWith(key, "DEFAULTBASE") || BeginsWith(key, "BASEARCHS")) {
+  } else if (StartsWith(key, "DEFAULTBASE") || StartsWith(key, "BASEARCHS")) {
     if (facts->arch) return;
-    UniqueText word(StrUtil_GetNextToken(&index, line.c_str(), " \n"));
+    Text word(StrUtil_GetNextToken(&index, line.c_str(), " \n"));
     if (word) facts->arch = word.get();
   }
 }
@@ -127,10 +127,11 @@ void EnterpriseClass(const std::string &product, ContentFacts *facts) {
 
 // Returns the identifier for the gathered facts, or null.
 const char *FromContent(const char *text, ContentFacts *facts) {
-  tvxguess::ForEachLine(text, [facts](std::string_view line) {
+  for (std::string_view line : tvx::guess::Lines(text)) {
+    if (line.empty()) continue;
     ReadContentLine(std::string(line), facts);
-    return !facts->decided;
-  });
+    if (facts->decided) break;
+  }
   if (facts->decided) return facts->guestOS;
 
   bool is64 = facts->arch && *facts->arch == "x86_64";
@@ -140,24 +141,24 @@ const char *FromContent(const char *text, ContentFacts *facts) {
   } else {
     const std::string &product = *facts->product;
     const char *name = product.c_str();
-    if (BeginsWithCaseless(name, "SUSE LINUX")) {
+    if (StartsWithCaseless(name, "SUSE LINUX")) {
       id = Pick(is64, "suse-64", "suse");
-    } else if (BeginsWithCaseless(name, "openSUSE")) {
+    } else if (StartsWithCaseless(name, "openSUSE")) {
       id = Pick(is64, "opensuse-64", "opensuse");
-    } else if (BeginsWith(name, "SUSE SLE") || BeginsWith(name, "SUSE_SLE")) {
+    } else if (StartsWith(name, "SUSE SLE") || StartsWith(name, "SUSE_SLE")) {
       id = SlesByMajor(facts->major, is64);
       EnterpriseClass(product, facts);
-    } else if (BeginsWith(name, "SLES-for-Tarvex")) {
+    } else if (StartsWith(name, "SLES-for-Tarvex")) {
       id = SlesByMajor(facts->major, is64);
-    } else if (BeginsWithCaseless(name, "Sun Java Desktop")) {
+    } else if (StartsWithCaseless(name, "Sun Java Desktop")) {
       id = "sjds";
-    } else if (BeginsWithCaseless(name, "Novell Linux Desktop")) {
+    } else if (StartsWithCaseless(name, "Novell Linux Desktop")) {
       id = "nld9";
     } else {
       id = facts->repoId;
     }
   }
-  if (id != nullptr && BeginsWith(id, "opensuse")) {
+  if (id != nullptr && StartsWith(id, "opensuse")) {
     facts->version = OpenSuseClass(facts->major, facts->minor, facts->version);
   }
   return id;
@@ -170,36 +171,34 @@ const char *FromProducts(GuessMedium *medium, const char *text, uint32_t *versio
   const char *name = text + skip;
   *version = GUESS_VERSION_UNKNOWN;
 
-  if (BeginsWith(name, "SLES9-SLD")) return "nld9";
-  if (BeginsWith(name, "SLES8-SLEC-i386-SUN")) return "sjds";
-  if (BeginsWith(name, "SUSE-Linux-Enterprise") || BeginsWith(name, "SUSE-Linux-SLES")) {
+  if (StartsWith(name, "SLES9-SLD")) return "nld9";
+  if (StartsWith(name, "SLES8-SLEC-i386-SUN")) return "sjds";
+  if (StartsWith(name, "SUSE-Linux-Enterprise") || StartsWith(name, "SUSE-Linux-SLES")) {
     unsigned int index = static_cast<unsigned int>(skip);
-    UniqueText productWord(StrUtil_GetNextToken(&index, text, " "));
+    Text productWord(StrUtil_GetNextToken(&index, text, " "));
     int32_t number = 0;
     int32_t major = StrUtil_GetNextIntToken(&number, &index, text, " \n") ? number : 0;
     if (Contains(text, "Desktop")) *version = GUESS_VERSION_SLED_ALL;
     return SlesByMajor(major, Contains(text, "x86_64"));
   }
-  if (BeginsWithCaseless(name, "SUSE-Linux")) {
+  if (StartsWithCaseless(name, "SUSE-Linux")) {
     return Pick(Contains(text, "x86_64") || Contains(text, "x86-64"), "suse-64", "suse");
   }
-  if (BeginsWith(name, "openSUSE-Leap 15.") || BeginsWith(name, "openSUSE 2018")) {
+  if (StartsWith(name, "openSUSE-Leap 15.") || StartsWith(name, "openSUSE 2018")) {
     *version = GUESS_VERSION_OPENSUSE_13_2_OR_HIGHER;
-    return Pick(tvxguess::DirExists(medium, "x86_64"), "opensuse-64", "opensuse");
+    return Pick(tvx::guess::DirExists(medium, "x86_64"), "opensuse-64", "opensuse");
   }
-  if (BeginsWith(name, "SLES15")) return "sles15-64";
+  if (StartsWith(name, "SLES15")) return "sles15-64";
   return nullptr;
 }
 
 bool HasSuseDiskMarker(GuessMedium *medium) {
-  GuessDir *root = Guess_OpenDir(medium, "");
-  if (root == nullptr) return false;
-  bool found = false;
-  for (const char *name; !found && (name = Guess_ReadDir(medium, root)) != nullptr;) {
-    found = BeginsWith(name, ".S.u.S.E-disk");
+  tvx::guess::Dir root(medium, "");
+  if (!root) return false;
+  for (const char *name; (name = root.Next()) != nullptr;) {
+    if (StartsWith(name, ".S.u.S.E-disk")) return true;
   }
-  Guess_CloseDir(medium, root);
-  return found;
+  return false;
 }
 
 bool HasLoaderConfig(GuessMedium *medium) {
@@ -212,16 +211,16 @@ bool HasLoaderConfig(GuessMedium *medium) {
 Bool Recognise(GuessMedium *medium, GuessResult *result) {
   const char *id = nullptr;
   uint32_t version = GUESS_VERSION_UNKNOWN;
-  if (UniqueText content{Guess_ReadFileName(medium, "content", nullptr)}) {
+  if (Text content = tvx::guess::ReadText(medium, "content")) {
     ContentFacts facts;
     id = FromContent(content.get(), &facts);
     version = facts.version;
-  } else if (UniqueText products{Guess_ReadFileName(medium, "media.1/products", nullptr)}) {
+  } else if (Text products = tvx::guess::ReadText(medium, "media.1/products")) {
     id = FromProducts(medium, products.get(), &version);
   } else if (HasSuseDiskMarker(medium)) {
     id = "suse";
   }
-  if (id == nullptr) return tvxguess::NotRecognised(result);
+  if (id == nullptr) return tvx::guess::NotRecognised(result);
 
   result->guestOS = id;
   result->version = version;
@@ -236,6 +235,6 @@ extern "C" TVX_EXPORT Bool Guess_SUSE(GuessMedium *medium, GuessResult *result) 
     return Recognise(medium, result);
   } catch (const std::exception &) {
     // Only allocation can throw here; the result is still untouched then.
-    return tvxguess::NotRecognised(result);
+    return tvx::guess::NotRecognised(result);
   }
 }

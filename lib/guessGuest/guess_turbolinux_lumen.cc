@@ -1,14 +1,14 @@
 // TurboLinux and Lumen install media: each is known by one marker at the
 // root of the medium.
-#include "lib/guessGuest/guess_text.h"
+#include "lib/guessGuest/guess_internal.h"
 #include "tvx_guess.h"
 
 extern "C" TVX_EXPORT Bool Guess_TurboLinux(GuessMedium *medium, GuessResult *result) {
-  tvxguess::UniqueText readme(Guess_ReadFileName(medium, "README", nullptr));
+  tvx::guess::Text readme = tvx::guess::ReadText(medium, "README");
   // The vendor spells its name "Turbolinux" on the first line of README;
   // other spellings belong to other media.
-  if (!readme || !tvxguess::BeginsWith(readme.get(), "Turbolinux")) {
-    return tvxguess::NotRecognised(result);
+  if (!readme || !tvx::guess::StartsWith(readme.get(), "Turbolinux")) {
+    return tvx::guess::NotRecognised(result);
   }
   result->guestOS = "turbolinux";
   result->version = GUESS_VERSION_UNKNOWN;
@@ -19,9 +19,9 @@ extern "C" TVX_EXPORT Bool Guess_TurboLinux(GuessMedium *medium, GuessResult *re
 // packages below "RPMS/<arch>". A medium with packages of both
 // architectures is ambiguous and names no identifier.
 extern "C" TVX_EXPORT Bool Guess_Lumen(GuessMedium *medium, GuessResult *result) {
-  if (!Guess_FileExists(medium, "", "LUMEN_TARVEX_CD")) return tvxguess::NotRecognised(result);
-  bool x86_64 = tvxguess::DirExists(medium, "RPMS/x86_64");
-  bool aarch64 = tvxguess::DirExists(medium, "RPMS/aarch64");
+  if (!Guess_FileExists(medium, "", "LUMEN_TARVEX_CD")) return tvx::guess::NotRecognised(result);
+  bool x86_64 = tvx::guess::DirExists(medium, "RPMS/x86_64");
+  bool aarch64 = tvx::guess::DirExists(medium, "RPMS/aarch64");
   if (x86_64 && !aarch64) {
     result->guestOS = "tarvex-lumen-64";
   } else if (aarch64 && !x86_64) {

@@ -9,9 +9,9 @@
 
 #include <gtest/gtest.h>
 
+#include "lib/guessGuest/guess_internal.h"
 #include "support/log_capture.h"
 #include "tvx_guess.h"
-#include "tvx_iso9660.h"
 
 namespace tvxtest {
 
@@ -51,29 +51,23 @@ inline void ExpectGuess(const GuessRow &row) {
   EXPECT_STREQ(r.displayName, "");
 }
 
-// An ISO 9660 image opened the way Guess_Guest opens it, for calling one
-// recogniser directly.
+// An image opened the way Guess_Guest opens it, for calling one recogniser
+// directly.
 class OpenedMedium {
  public:
-  explicit OpenedMedium(const std::string &image) : path_(MediaPath(image)) {
-    medium_.kind = GUESS_MEDIUM_ISO9660;
-    medium_.path = path_.data();
-    uint32_t formats = 0;
-    Iso9660_ListFormats(path_.c_str(), &formats);
-    if (Iso9660_Open(path_.c_str(), formats, &medium_.isoImage) != 0) medium_.isoImage = nullptr;
+  explicit OpenedMedium(const std::string &image) {
+    ok_ = tvx::guess::OpenMedium(MediaPath(image).c_str(), &medium_) != 0;
   }
-  ~OpenedMedium() {
-    if (medium_.isoImage != nullptr) Iso9660_Close(medium_.isoImage);
-  }
+  ~OpenedMedium() { tvx::guess::CloseMedium(&medium_); }
   OpenedMedium(const OpenedMedium &) = delete;
   OpenedMedium &operator=(const OpenedMedium &) = delete;
 
-  bool ok() const { return medium_.isoImage != nullptr; }
+  bool ok() const { return ok_; }
   GuessMedium *get() { return &medium_; }
 
  private:
-  std::string path_;
   GuessMedium medium_{};
+  bool ok_ = false;
 };
 
 }  // namespace tvxtest
