@@ -12,6 +12,8 @@
 #   PATH/      empty directory PATH
 #
 # Writes OUTDIR/NAME.iso. Needs SRC (the repository) in the environment.
+# With TVX_GUESS_SEEDS set to a directory, also writes the tree there in the
+# input format of fuzz/guess_fuzzer.cc, as a seed of the recognition target.
 
 image() {
   local outdir=$1 name=$2
@@ -39,6 +41,10 @@ image() {
     shift
   done
   mkdir -p "$outdir"
+  if [ -n "${TVX_GUESS_SEEDS:-}" ]; then
+    mkdir -p "$TVX_GUESS_SEEDS"
+    seed_of "$tree" "$volid" >"$TVX_GUESS_SEEDS/$(basename "$outdir")-$name"
+  fi
   case $mode in
     rr) xorriso -as mkisofs -R -J -quiet -no-pad -V "$volid" -o "$outdir/$name.iso" "$tree" 2>/dev/null ;;
     plain) xorriso -as mkisofs -quiet -no-pad -V "$volid" -o "$outdir/$name.iso" "$tree" 2>/dev/null ;;
@@ -47,6 +53,22 @@ image() {
   local rc=$?
   rm -rf "$tree"
   [ $rc -eq 0 ] || { echo "image: mastering $name failed" >&2; return 1; }
+}
+
+# seed_of TREE VOLID: the tree as entries separated by \x01, each a path
+# line and the file's first 64 KiB ("@volume" names the volume identifier).
+seed_of() {
+  local tree=$1 p
+  printf '\x01@volume\n%s' "$2"
+  (cd "$tree" && find . -mindepth 1 | LC_ALL=C sort) | while IFS= read -r p; do
+    p=${p#./}
+    if [ -d "$tree/$p" ]; then
+      printf '\x01%s/\n' "$p"
+    else
+      printf '\x01%s\n' "$p"
+      head -c 65536 "$tree/$p"
+    fi
+  done
 }
 
 # table OUTDIR FILE: reads "NAME | TEXT | MORE ENTRIES..." rows
