@@ -76,8 +76,10 @@ void Append(xmlNode *parent, xmlNode *elder, xmlNode *child) {
   xmlNode *closing = parent->last;
   xmlNode *indent = elder->prev;
   if (IsBlankText(closing) && closing != indent && IsBlankText(indent)) {
-    xmlAddPrevSibling(closing, xmlNewText(indent->content));
+    // Adding the indentation next to the closing text would merge the two.
     xmlAddPrevSibling(closing, child);
+    xmlNode *copy = xmlNewText(indent->content);
+    if (copy != nullptr) xmlAddPrevSibling(child, copy);
     return;
   }
   xmlAddChild(parent, child);
