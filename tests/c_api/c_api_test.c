@@ -34,8 +34,18 @@ static void TestBase(void) {
   Tvx_SetLogSink(NULL, NULL);
 }
 
+static void TestUdf(void) {
+  phase = "udf_open_missing";
+  CHECK(UDF_Open("/nonexistent/tvx-udf-test.iso") == NULL);
+  CHECK(UDF_OpenWithReader(NULL, NULL, NULL) == NULL);
+  CHECK(UDF_CloseDir(NULL) == FALSE);
+  CHECK(UDF_GetVolumeId(NULL) == NULL);
+  UDF_Close(NULL);
+}
+
 int main(void) {
   TestBase();
+  TestUdf();
   if (failures == 0) printf("c_api: all phases passed\n");
   return failures == 0 ? 0 : 1;
 }
