@@ -34,16 +34,9 @@ static std::string Env(const char *name, const char *fallback) {
   return v != nullptr ? v : fallback;
 }
 
-// The build compiles in where things are, because gtest_discover_tests hands
-// only the first variable of an ENVIRONMENT list to each test; the variables
-// still win when set.
 #ifndef TVX_TEST_SOURCE_DIR
 #define TVX_TEST_SOURCE_DIR "."
-#endif
-#ifndef TVX_TEST_MEDIA_DIR
 #define TVX_TEST_MEDIA_DIR "test-media"
-#endif
-#ifndef TVX_TEST_TOOL
 #define TVX_TEST_TOOL "tvxguest"
 #endif
 
