@@ -35,6 +35,15 @@ static void TestBase(void) {
   Tvx_SetLogSink(NULL, NULL);
 }
 
+static void TestUdf(void) {
+  phase = "udf_open_missing";
+  CHECK(UDF_Open("/nonexistent/tvx-udf-test.iso") == NULL);
+  CHECK(UDF_OpenWithReader(NULL, NULL, NULL) == NULL);
+  CHECK(UDF_CloseDir(NULL) == FALSE);
+  CHECK(UDF_GetVolumeId(NULL) == NULL);
+  UDF_Close(NULL);
+}
+
 /* Writes through the INI calls into a temporary file and reads back. */
 static void TestIni(void) {
   char path[] = "/tmp/tvx_c_api_ini_XXXXXX";
@@ -59,9 +68,49 @@ static void TestIni(void) {
   CHECK(!IniUtil_WriteIniFileString(path, "S", "K", "v", FALSE));
 }
 
+/* Support, limits and validation for a hand-made recognition result. */
+static void TestAutoInstall(void) {
+  GuessResult guess;
+  AutoInstallConfigInfo info;
+  char *message = NULL;
+  char *pretty;
+  phase = "autoinstall";
+  memset(&guess, 0, sizeof guess);
+  guess.guestOS = "centos7-64";
+  guess.version = GUESS_VERSION_CENTOS_7;
+  CHECK(AutoInstall_IsSupportedGuest(&guess));
+  CHECK(AutoInstall_GetInstallConfigInfo("linux", &guess, &info));
+  CHECK(info.shortNameMaxLength == 32 && info.nameMaxLength == 52);
+  CHECK(info.reservedShortNames != NULL && strcmp(info.reservedShortNames[0].name, "root") == 0);
+  CHECK(AutoInstall_ValidateShortName("linux", &guess, "Bob", &message) ==
+        AUTOINSTALL_TEXT_BAD_LINUX_USERNAME);
+  CHECK(message != NULL);
+  free(message);
+  CHECK(AutoInstall_ValidatePassword("linux", &guess, "a,b", NULL) == AUTOINSTALL_TEXT_OK);
+  CHECK(AutoInstallValidateWindowsText(NULL, "a,b", AUTOINSTALL_TEXT_NAME, NULL) ==
+        AUTOINSTALL_TEXT_BAD_WINDOWS_NAME);
+  pretty = AutoInstall_GetPrettyWindowsName("Windows 10 ENTERPRISEN");
+  CHECK(pretty != NULL && strcmp(pretty, "Windows 10 Enterprise N") == 0);
+  free(pretty);
+}
+
+static void TestIso9660(void) {
+  phase = "iso9660";
+  Iso9660Image *image = (Iso9660Image *)&image; /* must be cleared */
+  uint32_t formats = 0;
+  CHECK(Iso9660_Open("/nonexistent/tvx-missing.iso", 0, &image) == ISO9660_ERR_IO);
+  CHECK(image == NULL);
+  CHECK(Iso9660_ListFormats("/nonexistent/tvx-missing.iso", &formats) == ISO9660_ERR_IO);
+  CHECK(Iso9660_GetVolumeId(NULL) == NULL);
+  CHECK(sizeof(((Iso9660DirEntry *)0)->name) == 256);
+}
+
 int main(void) {
   TestBase();
+  TestIso9660();
+  TestUdf();
   TestIni();
+  TestAutoInstall();
   if (failures == 0) printf("c_api: all phases passed\n");
   return failures == 0 ? 0 : 1;
 }
