@@ -66,3 +66,9 @@ EOT
 
 image "$out" disk-marker ".S.u.S.E-disk-001.30_08_2004=" suse/
 image "$out" no-marker "S.u.S.E-disk-001=" suse/
+
+# One "content" line of 1 MiB, without line ends.
+big=$(mktemp)
+trap 'rm -f "$big"' EXIT
+{ printf 'PRODUCT SUSE SLES '; head -c 1048576 /dev/zero | tr '\0' 'x'; } >"$big"
+image "$out" bad-huge "content@$big"

@@ -91,6 +91,7 @@ TEST(GuessSUSE, RootMarkerAndDamagedFiles) {
       // The carriage returns stay in the values: "x86_64\r" is not x86_64.
       {"suse/bad-crlf", "sles10", GUESS_VERSION_SLES_10_SP2_OR_LOWER, kNoIso},
       {"suse/bad-version", "opensuse", GUESS_VERSION_OPENSUSE_11_2_OR_LOWER, kNoIso},
+      {"suse/bad-huge", "sles", 0, kNoIso},
   };
   for (const GuessRow &row : rows) ExpectGuess(row);
 }
