@@ -214,7 +214,12 @@ TVX_EXPORT char *Guess_GetVersionString(const char *name, const GuessResult *res
     default:
       return UtilSafeStrdup0(base);
   }
-  tvx::guess::Text suffix(Msg_GetString(msgId));
+  tvx::guess::Text suffix;
+  try {
+    suffix.reset(Msg_GetString(msgId));
+  } catch (...) {  // allocation failure: show the plain name
+    return UtilSafeStrdup0(base);
+  }
   if (suffix == nullptr || suffix.get()[0] == '\0') return UtilSafeStrdup0(base);
   return Str_SafeAsprintf(nullptr, "%s %s", base, suffix.get());
 }

@@ -262,7 +262,11 @@ TVX_EXPORT char *Guess_ReadFileName(GuessMedium *medium, const char *path, uint6
   if (medium == nullptr || path == nullptr) return nullptr;
   char *dirPart = nullptr;
   char *base = nullptr;
-  File_GetPathName(path, &dirPart, &base);
+  try {
+    File_GetPathName(path, &dirPart, &base);
+  } catch (...) {  // allocation failure inside the platform's splitter
+    return nullptr;
+  }
   char *data = nullptr;
   GuessDir *dir = Guess_OpenDir(medium, dirPart != nullptr ? dirPart : "");
   if (dir != nullptr) {
