@@ -1,5 +1,6 @@
 /* Compiles every public header as C11 and calls through each, so a C host
  * can build against them. Returns 0 when every phase passes. */
+#define _POSIX_C_SOURCE 200809L /* mkstemp, fdopen */
 #include "tvx_all_headers.h"
 
 #include <stdio.h>
@@ -34,6 +35,7 @@ static void TestBase(void) {
   Tvx_SetLogSink(NULL, NULL);
 }
 
+<<<<<<< HEAD
 static void TestGuess(void) {
   phase = "guess";
   GuessResult r;
@@ -49,11 +51,76 @@ static void TestGuess(void) {
   unsigned char elf[20] = {0};
   elf[18] = 62;
   CHECK(Guess_ELF_Arch(elf, sizeof elf) == GUESS_ELF_ARCH_X86_64);
+=======
+static void TestUdf(void) {
+  phase = "udf_open_missing";
+  CHECK(UDF_Open("/nonexistent/tvx-udf-test.iso") == NULL);
+  CHECK(UDF_OpenWithReader(NULL, NULL, NULL) == NULL);
+  CHECK(UDF_CloseDir(NULL) == FALSE);
+  CHECK(UDF_GetVolumeId(NULL) == NULL);
+  UDF_Close(NULL);
+}
+
+/* Writes through the INI calls into a temporary file and reads back. */
+static void TestIni(void) {
+  char path[] = "/tmp/tvx_c_api_ini_XXXXXX";
+  char value[32] = "";
+  int32_t n = 0;
+  FILE *f;
+  int fd;
+  phase = "ini";
+  fd = mkstemp(path);
+  CHECK(fd >= 0);
+  if (fd < 0) return;
+  f = fdopen(fd, "w");
+  fputs("; answer file\n[Data]\nAutoPartition=1\n", f);
+  fclose(f);
+  CHECK(IniUtil_WriteIniFileString(path, "UserData", "FullName", "Jane Doe", TRUE));
+  CHECK(IniUtil_WriteIniFileInt(path, "Data", "AutoPartition", 0));
+  CHECK(IniUtil_GetIniFileString(path, "userdata", "fullname", value, (int32_t)sizeof value));
+  CHECK(strcmp(value, "Jane Doe") == 0);
+  CHECK(IniUtil_GetIniFileInt(path, "Data", "AutoPartition", &n) && n == 0);
+  CHECK(!IniUtil_GetIniFileString(path, "Data", "AutoPartition", NULL, 8));
+  remove(path);
+  CHECK(!IniUtil_WriteIniFileString(path, "S", "K", "v", FALSE));
+}
+
+/* Support, limits and validation for a hand-made recognition result. */
+static void TestAutoInstall(void) {
+  GuessResult guess;
+  AutoInstallConfigInfo info;
+  char *message = NULL;
+  char *pretty;
+  phase = "autoinstall";
+  memset(&guess, 0, sizeof guess);
+  guess.guestOS = "centos7-64";
+  guess.version = GUESS_VERSION_CENTOS_7;
+  CHECK(AutoInstall_IsSupportedGuest(&guess));
+  CHECK(AutoInstall_GetInstallConfigInfo("linux", &guess, &info));
+  CHECK(info.shortNameMaxLength == 32 && info.nameMaxLength == 52);
+  CHECK(info.reservedShortNames != NULL && strcmp(info.reservedShortNames[0].name, "root") == 0);
+  CHECK(AutoInstall_ValidateShortName("linux", &guess, "Bob", &message) ==
+        AUTOINSTALL_TEXT_BAD_LINUX_USERNAME);
+  CHECK(message != NULL);
+  free(message);
+  CHECK(AutoInstall_ValidatePassword("linux", &guess, "a,b", NULL) == AUTOINSTALL_TEXT_OK);
+  CHECK(AutoInstallValidateWindowsText(NULL, "a,b", AUTOINSTALL_TEXT_NAME, NULL) ==
+        AUTOINSTALL_TEXT_BAD_WINDOWS_NAME);
+  pretty = AutoInstall_GetPrettyWindowsName("Windows 10 ENTERPRISEN");
+  CHECK(pretty != NULL && strcmp(pretty, "Windows 10 Enterprise N") == 0);
+  free(pretty);
+>>>>>>> main
 }
 
 int main(void) {
   TestBase();
+<<<<<<< HEAD
   TestGuess();
+=======
+  TestUdf();
+  TestIni();
+  TestAutoInstall();
+>>>>>>> main
   if (failures == 0) printf("c_api: all phases passed\n");
   return failures == 0 ? 0 : 1;
 }

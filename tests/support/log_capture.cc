@@ -34,9 +34,12 @@ static std::string Env(const char *name, const char *fallback) {
   return v != nullptr ? v : fallback;
 }
 
-// The build's own paths are the defaults, so the test binary finds its media
-// when run by hand or by CTest (whose per-test environment list does not
-// survive gtest_discover_tests intact).
+#ifndef TVX_TEST_SOURCE_DIR
+#define TVX_TEST_SOURCE_DIR "."
+#define TVX_TEST_MEDIA_DIR "test-media"
+#define TVX_TEST_TOOL "tvxguest"
+#endif
+
 std::string SourceDir() { return Env("TVX_SOURCE_DIR", TVX_TEST_SOURCE_DIR); }
 std::string MediaDir() { return Env("TVX_MEDIA_DIR", TVX_TEST_MEDIA_DIR); }
 std::string ToolPath() { return Env("TVX_TOOL", TVX_TEST_TOOL); }
