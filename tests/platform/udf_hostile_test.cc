@@ -237,6 +237,13 @@ TEST(UdfHostile, MalformedStructuresFailCleanly) {
          tvxtest::SealTag(img, fe);
        },
        1, ""},
+      {"size beyond the allocation descriptors", nullptr,
+       [&](auto *img, const UdfLayout &l) {
+         size_t fe = At(l, l.entrySector.at("big.bin"));
+         tvxtest::PutLe32(img, fe + 60, 1);  // 4 GiB more than recorded
+         tvxtest::SealTag(img, fe);
+       },
+       1, ""},
       {"embedded data longer than its entry",
        [](UdfBuildOptions *o) { o->embedSmallFiles = true; },
        [&](auto *img, const UdfLayout &l) {
