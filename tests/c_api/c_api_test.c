@@ -94,8 +94,20 @@ static void TestAutoInstall(void) {
   free(pretty);
 }
 
+static void TestIso9660(void) {
+  phase = "iso9660";
+  Iso9660Image *image = (Iso9660Image *)&image; /* must be cleared */
+  uint32_t formats = 0;
+  CHECK(Iso9660_Open("/nonexistent/tvx-missing.iso", 0, &image) == ISO9660_ERR_IO);
+  CHECK(image == NULL);
+  CHECK(Iso9660_ListFormats("/nonexistent/tvx-missing.iso", &formats) == ISO9660_ERR_IO);
+  CHECK(Iso9660_GetVolumeId(NULL) == NULL);
+  CHECK(sizeof(((Iso9660DirEntry *)0)->name) == 256);
+}
+
 int main(void) {
   TestBase();
+  TestIso9660();
   TestUdf();
   TestIni();
   TestAutoInstall();
