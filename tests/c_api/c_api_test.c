@@ -105,8 +105,26 @@ static void TestIso9660(void) {
   CHECK(sizeof(((Iso9660DirEntry *)0)->name) == 256);
 }
 
+static void TestGuess(void) {
+  phase = "guess";
+  GuessResult r;
+  memset(&r, 0x5A, sizeof r);
+  CHECK(Guess_Guest("/nonexistent/image.iso", NULL, &r) == 2);
+  CHECK(r.guestOS == NULL && r.language[0] == '\0');
+  CHECK(Guess_IsEqual(&r, &r));
+  CHECK(strcmp(Guess_GetSubString(GUESS_VERSION_UNKNOWN), SUB_NAMES[0]) == 0);
+  r.guestOS = "winXPPro";
+  char *text = Guess_GetVersionString("Windows XP Professional", &r);
+  CHECK(text != NULL && strcmp(text, "Windows XP Professional") == 0);
+  free(text);
+  unsigned char elf[20] = {0};
+  elf[18] = 62;
+  CHECK(Guess_ELF_Arch(elf, sizeof elf) == GUESS_ELF_ARCH_X86_64);
+}
+
 int main(void) {
   TestBase();
+  TestGuess();
   TestIso9660();
   TestUdf();
   TestIni();
