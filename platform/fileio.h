@@ -46,6 +46,12 @@ struct FileIODescriptor {
 
 void FileIO_Invalidate(FileIODescriptor *fd);
 Bool FileIO_IsValid(const FileIODescriptor *fd);
+// FileIO_Open opens with the access bits (read, write or both; 0x2001 is read
+// of a large file) and an action. Results: SUCCESS; FILE_NOT_FOUND,
+// NO_PERMISSION, OPEN_ERROR_EXIST (CREATE_SAFE on an existing file),
+// FILE_NAME_TOO_LONG, LOCK_FAILED; ERROR for a directory, for no access bit,
+// an unknown action, or emptying without write access. `fd` is invalid on
+// failure.
 FileIOResult FileIO_Open(FileIODescriptor *fd, const char *path, unsigned access, int action);
 // FileIO_Read reads up to `len` bytes; FILEIO_SUCCESS when all were read,
 // FILEIO_READ_ERROR_EOF when end of file came first (*out_count tells how
@@ -57,6 +63,8 @@ FileIOResult FileIO_Write(FileIODescriptor *fd, const void *buf, size_t len, siz
 FileIOResult FileIO_Pread(FileIODescriptor *fd, void *buf, size_t len, uint64_t offset);
 // FileIO_GetSize returns the size in bytes, or all bits set on failure.
 uint64_t FileIO_GetSize(const FileIODescriptor *fd);
+// FileIO_Close closes and invalidates `fd`; closing an invalid descriptor is
+// a harmless SUCCESS.
 FileIOResult FileIO_Close(FileIODescriptor *fd);
 // FileIO_ErrorEnglish describes a result code (constant text).
 const char *FileIO_ErrorEnglish(FileIOResult result);

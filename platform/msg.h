@@ -13,16 +13,18 @@
 // Msg_GetString returns the localised text (allocated), or null when the id
 // text is malformed (marker without a closing parenthesis).
 char *Msg_GetString(const char *idFmt);
-// Msg_GetStringSafe is Msg_GetString that never returns null: a malformed id
-// text comes back as a copy of itself.
+// Msg_GetStringSafe is Msg_GetString that accepts null (and returns null for
+// it); a malformed id text comes back as a copy of itself. A catalogue text
+// whose printf conversions differ from the default text's is never used.
 char *Msg_GetStringSafe(const char *idFmt);
 // Msg_Format localises the id text and formats it with the arguments
 // (allocated, never null).
 char *Msg_Format(const char *idFmt, ...);
 char *Msg_VFormat(const char *idFmt, va_list args);
 // Msg_Append adds a localised, formatted message to the calling thread's
-// pending list; Msg_GetMessagesAndReset returns the pending messages joined
-// (allocated, possibly empty, never null) and clears the list.
+// pending list (trailing line ends dropped); Msg_GetMessagesAndReset returns
+// the pending messages joined with "; " (allocated, possibly empty, never
+// null) and clears the list. A malformed id text is formatted as it stands.
 void Msg_Append(const char *idFmt, ...);
 char *Msg_GetMessagesAndReset(void);
 // Msg_LoadCatalogue loads a catalogue (dictionary format: id = "text") for

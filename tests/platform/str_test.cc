@@ -1,0 +1,172 @@
+#include "platform/str.h"
+
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+#include <string>
+#include <vector>
+
+namespace {
+
+std::vector<std::string> Tokens(const char *text, const char *delims) {
+  std::vector<std::string> out;
+  unsigned int index = 0;
+  while (char *t = StrUtil_GetNextToken(&index, text, delims)) {
+    out.emplace_back(t);
+    std::free(t);
+  }
+  return out;
+}
+
+TEST(StrUtil, TokensSkipRunsOfDelimitersAndKeepCarriageReturns) {
+  struct Case {
+    const char *text, *delims;
+    std::vector<std::string> want;
+  } cases[] = {
+      {"a\nb\nc", "\n", {"a", "b", "c"}},
+      {"\n\nfirst\n\n\nsecond\n", "\n", {"first", "second"}},
+      {"line1\r\nline2\r\n", "\n", {"line1\r", "line2\r"}},
+      {"", "\n", {}},
+      {"\n\n\n", "\n", {}},
+      {"Ubuntu 14.04.2 LTS", " ", {"Ubuntu", "14.04.2", "LTS"}},
+      {"version=2008.1, x\nmore", " ,\n", {"version=2008.1", "x", "more"}},
+      {"  KEY  value \n", " \n", {"KEY", "value"}},
+  };
+  for (const auto &c : cases) EXPECT_EQ(Tokens(c.text, c.delims), c.want) << c.text;
+}
+
+TEST(StrUtil, TokenIndexPastEndIsSafe) {
+  unsigned int index = 100;
+  EXPECT_EQ(StrUtil_GetNextToken(&index, "short", " "), nullptr);
+  index = 0;
+  char *t = StrUtil_GetNextToken(&index, "ab cd", " ");
+  ASSERT_NE(t, nullptr);
+  EXPECT_EQ(index, 3u);  // past the token and one delimiter
+  std::free(t);
+}
+
+TEST(StrUtil, IntTokensAreWholeNumbersOnly) {
+  // The way the recognisers read "VERSION 11.0": the key, then two numbers.
+  const char *line = "VERSION 11.0";
+  unsigned int index = 0;
+  char *key = StrUtil_GetNextToken(&index, line, " \n");
+  ASSERT_STREQ(key, "VERSION");
+  std::free(key);
+  int32_t major = -1, minor = -1;
+  EXPECT_TRUE(StrUtil_GetNextIntToken(&major, &index, line, "."));
+  EXPECT_TRUE(StrUtil_GetNextIntToken(&minor, &index, line, "."));
+  EXPECT_EQ(major, 11);
+  EXPECT_EQ(minor, 0);
+  EXPECT_FALSE(StrUtil_GetNextIntToken(&minor, &index, line, "."));
+
+  struct Case {
+    const char *text;
+    bool ok;
+    int32_t want;
+  } cases[] = {
+      {"..42..", true, 42},     {"-7", true, -7},          {"+3", true, 3},
+      {"11-0", false, 0},       {"5a", false, 0},          {"0x10", false, 0},
+      {"2147483647", true, INT32_MAX}, {"-2147483648", true, INT32_MIN},
+      {"2147483648", false, 0}, {"99999999999999999999", false, 0}, {"-", false, 0},
+  };
+  for (const auto &c : cases) {
+    int32_t v = 12345;
+    unsigned int i = 0;
+    EXPECT_EQ(StrUtil_GetNextIntToken(&v, &i, c.text, ".") != 0, c.ok) << c.text;
+    if (c.ok) {
+      EXPECT_EQ(v, c.want) << c.text;
+    }
+  }
+}
+
+TEST(StrUtil, NumberConversionsRefuseJunkAndOverflow) {
+  struct Case {
+    const char *text;
+    bool intOk;
+    int32_t intWant;
+    bool uintOk;
+    uint32_t uintWant;
+  } cases[] = {
+      {"12", true, 12, true, 12},
+      {"  12", true, 12, true, 12},
+      {"0x1F", true, 31, true, 31},
+      {"-5", true, -5, false, 0},
+      {"4294967295", false, 0, true, UINT32_MAX},
+      {"4294967296", false, 0, false, 0},
+      {"12 ", false, 0, false, 0},
+      {"", false, 0, false, 0},
+      {"0x", false, 0, false, 0},
+      {"1.5", false, 0, false, 0},
+  };
+  for (const auto &c : cases) {
+    int32_t i = 0;
+    uint32_t u = 0;
+    EXPECT_EQ(StrUtil_StrToInt(&i, c.text) != 0, c.intOk) << c.text;
+    if (c.intOk) {
+      EXPECT_EQ(i, c.intWant) << c.text;
+    }
+    EXPECT_EQ(StrUtil_StrToUint(&u, c.text) != 0, c.uintOk) << c.text;
+    if (c.uintOk) {
+      EXPECT_EQ(u, c.uintWant) << c.text;
+    }
+  }
+}
+
+TEST(StrUtil, DecimalStrToUintAdvancesOnlyOnSuccess) {
+  const char *s = "10.2";
+  unsigned int v = 0;
+  EXPECT_TRUE(StrUtil_DecimalStrToUint(&v, &s));
+  EXPECT_EQ(v, 10u);
+  EXPECT_STREQ(s, ".2");
+  EXPECT_FALSE(StrUtil_DecimalStrToUint(&v, &s));
+  EXPECT_STREQ(s, ".2");
+  const char *big = "4294967296x";
+  EXPECT_FALSE(StrUtil_DecimalStrToUint(&v, &big));
+  EXPECT_STREQ(big, "4294967296x");
+}
+
+TEST(Str, CopyAndConcatenateCutAndTerminate) {
+  char buf[8];
+  EXPECT_STREQ(Str_Strcpy(buf, "abcdefghij", sizeof buf), "abcdefg");
+  EXPECT_STREQ(Str_Strcpy(buf, "abc", sizeof buf), "abc");
+  EXPECT_STREQ(Str_Strcat(buf, "1234", sizeof buf), "abc1234");
+  EXPECT_STREQ(Str_Strcat(buf, "zz", sizeof buf), "abc1234");
+  Str_Strcpy(buf, "ab", sizeof buf);
+  EXPECT_STREQ(Str_Strcat(buf, "cdefghijk", sizeof buf), "abcdefg");
+  char one[1] = {'x'};
+  EXPECT_STREQ(Str_Strcpy(one, "abc", sizeof one), "");
+  char unterminated[4] = {'a', 'b', 'c', 'd'};
+  EXPECT_STREQ(Str_Strcat(unterminated, "x", sizeof unterminated), "abc");
+}
+
+TEST(Str, SnprintfReportsCuts) {
+  char buf[6];
+  EXPECT_EQ(Str_Snprintf(buf, sizeof buf, "%s", "12345"), 5);
+  EXPECT_EQ(Str_Snprintf(buf, sizeof buf, "%s", "123456"), -1);
+  EXPECT_STREQ(buf, "12345");
+  size_t len = 0;
+  char *s = Str_Asprintf(&len, "%s-%d", "x", 42);
+  EXPECT_STREQ(s, "x-42");
+  EXPECT_EQ(len, 4u);
+  std::free(s);
+}
+
+TEST(StrDeathTest, SprintfPanicsOnCut) {
+  char buf[4];
+  EXPECT_DEATH(Str_Sprintf(buf, sizeof buf, "%s", "toolong"), "Str_Sprintf");
+}
+
+TEST(StrUtil, AffixTests) {
+  EXPECT_TRUE(StrUtil_StartsWith("install_x.clg", "install_"));
+  EXPECT_FALSE(StrUtil_StartsWith("Install_x.clg", "install_"));
+  EXPECT_TRUE(StrUtil_CaselessStartsWith("WinXPPro", "winxp"));
+  EXPECT_FALSE(StrUtil_StartsWith("in", "install_"));
+  EXPECT_TRUE(StrUtil_EndsWith("install_x.clg", ".clg"));
+  EXPECT_FALSE(StrUtil_EndsWith("g", ".clg"));
+  EXPECT_TRUE(StrUtil_CaselessEndsWith("ISOLINUX.CFG", ".cfg"));
+  char text[] = "MiXeD 1";
+  EXPECT_STREQ(Str_ToUpper(text), "MIXED 1");
+  EXPECT_STREQ(Str_ToLower(text), "mixed 1");
+}
+
+}  // namespace

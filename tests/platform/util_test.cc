@@ -1,0 +1,83 @@
+#include "platform/util.h"
+
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+#include <cstring>
+#include <string>
+
+#include "platform/dynbuf.h"
+
+namespace {
+
+int Sign(int v) { return v < 0 ? -1 : v > 0 ? 1 : 0; }
+
+TEST(Util, CompareDottedHandlesUnevenVersionsAndTails) {
+  struct Case {
+    const char *a, *b;
+    int want;
+  } cases[] = {
+      {"8", "8.0", 0},
+      {"8.0.0", "8", 0},
+      {"14.04.2", "14.04", 1},
+      {"14.04", "14.04.2", -1},
+      {"14.04", "14.4", 0},  // numbers, not texts
+      {"14.10", "14.04", 1},
+      {"2008.1", "2008.0", 1},
+      {"2008.0", "2008.1", -1},
+      {"9", "10", -1},
+      {"14.04.2-desktop", "14.04.2", 1},
+      {"14.04.2-desktop", "14.04.3", -1},
+      {"14.04.2-desktop", "14.04.2-server", -1},
+      {"1.alpha", "1.beta", -1},
+      {"12345678901234567890", "12345678901234567891", -1},
+      {"", "0", 0},
+      {"8.", "8", 0},
+      {"", "1", -1},
+  };
+  for (const auto &c : cases) {
+    EXPECT_EQ(Sign(Util_CompareDotted(c.a, c.b)), c.want) << c.a << " vs " << c.b;
+    EXPECT_EQ(Sign(Util_CompareDotted(c.b, c.a)), -c.want) << c.b << " vs " << c.a;
+  }
+}
+
+TEST(Util, SafeAllocationsAreZeroedAndNullTolerant) {
+  char *p = static_cast<char *>(UtilSafeMalloc0(0));
+  ASSERT_NE(p, nullptr);
+  std::free(p);
+  auto *z = static_cast<unsigned char *>(UtilSafeMalloc0(64));
+  for (int i = 0; i < 64; i++) EXPECT_EQ(z[i], 0) << i;
+  std::free(z);
+  EXPECT_EQ(UtilSafeStrdup0(nullptr), nullptr);
+  char *n = UtilSafeStrndup0("abcdef", 3);
+  EXPECT_STREQ(n, "abc");
+  std::free(n);
+}
+
+TEST(DynBuf, AppendsGrowAndDetachTerminatesEmpty) {
+  DynBuf b;
+  DynBuf_Init(&b);
+  std::string want;
+  for (int i = 0; i < 1000; i++) {
+    DynBuf_Strcat(&b, "block ");
+    want += "block ";
+  }
+  // Appending the buffer's own bytes must survive the reallocation.
+  DynBuf_Append(&b, DynBuf_Get(&b), DynBuf_GetSize(&b));
+  want += want;
+  DynBuf_AppendByte(&b, '\0');
+  EXPECT_EQ(DynBuf_GetSize(&b), want.size() + 1);
+  EXPECT_STREQ(DynBuf_Get(&b), want.c_str());
+  char *detached = static_cast<char *>(DynBuf_Detach(&b));
+  EXPECT_EQ(DynBuf_GetSize(&b), 0u);
+  std::free(detached);
+  char *empty = static_cast<char *>(DynBuf_Detach(&b));
+  ASSERT_NE(empty, nullptr);
+  EXPECT_EQ(empty[0], '\0');
+  std::free(empty);
+  DynBuf_SetSize(&b, 10);
+  EXPECT_EQ(std::memcmp(DynBuf_Get(&b), "\0\0\0\0\0\0\0\0\0\0", 10), 0);
+  DynBuf_Destroy(&b);
+}
+
+}  // namespace
