@@ -73,7 +73,13 @@ TVX_EXPORT Bool IniUtil_GetIniFileInt(const char *path, const char *section,
  * double quotes when `quoted`). TRUE when the file was rewritten. FALSE, with
  * the file unchanged, when the file does not exist or cannot be read, a header
  * line lacks its "]", the text would exceed the size limit, or the new file
- * cannot be written (no space, no permission on the directory). */
+ * cannot be written (no space, no permission on the directory). Also refused:
+ * a line break in any argument, and a section or key that the reading rules
+ * could never find again (a section holding "]" or ";", a key holding "=" or
+ * ";" or beginning with "[" or a blank, either too long for one line). A
+ * value too long for its line is clipped so that the line stays within 1023
+ * bytes. When the old key line was longer than one piece, its remaining
+ * pieces go with the old value. */
 TVX_EXPORT Bool IniUtil_WriteIniFileString(const char *path, const char *section,
                                            const char *key, const char *value,
                                            Bool quoted);

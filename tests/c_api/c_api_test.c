@@ -1,5 +1,6 @@
 /* Compiles every public header as C11 and calls through each, so a C host
  * can build against them. Returns 0 when every phase passes. */
+#define _POSIX_C_SOURCE 200809L /* mkstemp, fdopen */
 #include "tvx_all_headers.h"
 
 #include <stdio.h>
@@ -34,8 +35,33 @@ static void TestBase(void) {
   Tvx_SetLogSink(NULL, NULL);
 }
 
+/* Writes through the INI calls into a temporary file and reads back. */
+static void TestIni(void) {
+  char path[] = "/tmp/tvx_c_api_ini_XXXXXX";
+  char value[32] = "";
+  int32_t n = 0;
+  FILE *f;
+  int fd;
+  phase = "ini";
+  fd = mkstemp(path);
+  CHECK(fd >= 0);
+  if (fd < 0) return;
+  f = fdopen(fd, "w");
+  fputs("; answer file\n[Data]\nAutoPartition=1\n", f);
+  fclose(f);
+  CHECK(IniUtil_WriteIniFileString(path, "UserData", "FullName", "Jane Doe", TRUE));
+  CHECK(IniUtil_WriteIniFileInt(path, "Data", "AutoPartition", 0));
+  CHECK(IniUtil_GetIniFileString(path, "userdata", "fullname", value, (int32_t)sizeof value));
+  CHECK(strcmp(value, "Jane Doe") == 0);
+  CHECK(IniUtil_GetIniFileInt(path, "Data", "AutoPartition", &n) && n == 0);
+  CHECK(!IniUtil_GetIniFileString(path, "Data", "AutoPartition", NULL, 8));
+  remove(path);
+  CHECK(!IniUtil_WriteIniFileString(path, "S", "K", "v", FALSE));
+}
+
 int main(void) {
   TestBase();
+  TestIni();
   if (failures == 0) printf("c_api: all phases passed\n");
   return failures == 0 ? 0 : 1;
 }

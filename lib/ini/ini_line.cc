@@ -1,0 +1,58 @@
+#include "lib/ini/ini_line.h"
+
+#include <cstring>
+
+namespace tvx::ini {
+
+bool LineReader::Next(std::string *piece) {
+  piece->clear();
+  int c;
+  while (piece->size() < kMaxPiece && (c = std::getc(f_)) != EOF) {
+    piece->push_back(static_cast<char>(c));
+    if (c == '\n') break;
+  }
+  return !piece->empty();
+}
+
+bool HeaderName(std::string_view line, std::string_view *out_name) {
+  size_t close = line.find(']');
+  if (close == std::string_view::npos) return false;
+  *out_name = line.substr(1, close - 1);
+  return true;
+}
+
+KeyLine ParseKeyLine(std::string_view line) {
+  KeyLine k;
+  size_t start = 0;
+  while (start < line.size() && (line[start] == ' ' || line[start] == '\t')) ++start;
+  size_t eq = line.find('=', start);
+  if (eq != std::string_view::npos) {
+    k.key = line.substr(start, eq - start);
+    k.hasEquals = true;
+    k.valueOffset = eq + 1;
+    return k;
+  }
+  size_t end = line.size();
+  while (end > start && (line[end - 1] == '\n' || line[end - 1] == '\r')) --end;
+  k.key = line.substr(start, end - start);
+  return k;
+}
+
+bool CaselessEqual(std::string_view a, std::string_view b) {
+  if (a.size() != b.size()) return false;
+  for (size_t i = 0; i < a.size(); ++i) {
+    unsigned char x = static_cast<unsigned char>(a[i]);
+    unsigned char y = static_cast<unsigned char>(b[i]);
+    if (x >= 'A' && x <= 'Z') x = static_cast<unsigned char>(x - 'A' + 'a');
+    if (y >= 'A' && y <= 'Z') y = static_cast<unsigned char>(y - 'A' + 'a');
+    if (x != y) return false;
+  }
+  return true;
+}
+
+std::string_view AsCString(std::string_view line) {
+  size_t nul = line.find('\0');
+  return nul == std::string_view::npos ? line : line.substr(0, nul);
+}
+
+}  // namespace tvx::ini
