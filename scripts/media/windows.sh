@@ -135,7 +135,7 @@ write_lang() {  # FILE VARIANT
   esac
 }
 
-write_eicfg() {  # FILE SPEC
+write_eicfg() {  # FILE EDITION[,CHANNEL]
   case $2 in
     @empty) : >"$1" ;;
     @binary) binary >"$1" ;;
@@ -156,20 +156,21 @@ appx_manifest() {  # FILE WITH_SKYPE
   } >"$1"
 }
 
+label() { basename "$1" .iso | tr a-z- A-Z_ | cut -c1-32; }
+
 master_bridge() {  # TREE IMAGE
-  genisoimage -quiet -udf -iso-level 3 -J -joliet-long -R -V "$(basename "$2" .iso | tr a-z- A-Z_ | cut -c1-32)" \
-    -o "$2" "$1"
+  genisoimage -quiet -udf -iso-level 3 -J -joliet-long -R -V "$(label "$2")" -o "$2" "$1"
 }
 
 # UDF alone carries the tree; the ISO 9660 side holds only README.TXT.
 master_udf_only() {  # TREE IMAGE
-  /usr/bin/python3 - "$1" "$2" <<'PY'
+  /usr/bin/python3 - "$1" "$2" "$(label "$2")" <<'PY'
 import io, os, sys
 import pycdlib
-tree, image = sys.argv[1], sys.argv[2]
+tree, image, label = sys.argv[1], sys.argv[2], sys.argv[3]
 iso = pycdlib.PyCdlib()
-iso.new(interchange_level=3, udf='2.60', vol_ident='CCSA_X64FRE_EN-US_DV5')
-note = b'This disc contains a "UDF" file system and requires an operating system\r\nthat supports the ISO-13346 "UDF" file system specification.\r\n'
+iso.new(interchange_level=3, udf='2.60', vol_ident=label)
+note = b'This disc contains a "UDF" file system and requires an operating system\r\nthat reads ISO-13346 "UDF" file systems.\r\n'
 iso.add_fp(io.BytesIO(note), len(note), iso_path='/README.TXT;1')
 for root, dirs, files in os.walk(tree):
     dirs.sort()
