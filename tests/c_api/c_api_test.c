@@ -59,9 +59,36 @@ static void TestIni(void) {
   CHECK(!IniUtil_WriteIniFileString(path, "S", "K", "v", FALSE));
 }
 
+/* Support, limits and validation for a hand-made recognition result. */
+static void TestAutoInstall(void) {
+  GuessResult guess;
+  AutoInstallConfigInfo info;
+  char *message = NULL;
+  char *pretty;
+  phase = "autoinstall";
+  memset(&guess, 0, sizeof guess);
+  guess.guestOS = "centos7-64";
+  guess.version = GUESS_VERSION_CENTOS_7;
+  CHECK(AutoInstall_IsSupportedGuest(&guess));
+  CHECK(AutoInstall_GetInstallConfigInfo("linux", &guess, &info));
+  CHECK(info.shortNameMaxLength == 32 && info.nameMaxLength == 52);
+  CHECK(info.reservedShortNames != NULL && strcmp(info.reservedShortNames[0].name, "root") == 0);
+  CHECK(AutoInstall_ValidateShortName("linux", &guess, "Bob", &message) ==
+        AUTOINSTALL_TEXT_BAD_LINUX_USERNAME);
+  CHECK(message != NULL);
+  free(message);
+  CHECK(AutoInstall_ValidatePassword("linux", &guess, "a,b", NULL) == AUTOINSTALL_TEXT_OK);
+  CHECK(AutoInstallValidateWindowsText(NULL, "a,b", AUTOINSTALL_TEXT_NAME, NULL) ==
+        AUTOINSTALL_TEXT_BAD_WINDOWS_NAME);
+  pretty = AutoInstall_GetPrettyWindowsName("Windows 10 ENTERPRISEN");
+  CHECK(pretty != NULL && strcmp(pretty, "Windows 10 Enterprise N") == 0);
+  free(pretty);
+}
+
 int main(void) {
   TestBase();
   TestIni();
+  TestAutoInstall();
   if (failures == 0) printf("c_api: all phases passed\n");
   return failures == 0 ? 0 : 1;
 }

@@ -1,0 +1,56 @@
+// Display names of Windows images: prefix, edition key and modifier interplay.
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+#include <string>
+
+#include "tvx_autoinstall.h"
+
+namespace {
+
+TEST(WindowsPrettyName, KeysAndModifiers) {
+  const struct {
+    const char *raw, *pretty;
+  } cases[] = {
+      {"Windows 7 ULTIMATE", "Windows 7 Ultimate"},
+      {"Windows Longhorn SERVERSTANDARD", "Windows Server 2008 Standard"},
+      {"Windows Longhorn SERVERSTANDARDV", "Windows Server 2008 Standard without Hyper-V"},
+      {"Windows Server 2016 Technical Preview 5 SERVERDATACENTERCORE",
+       "Windows Server 2016 TP5 Datacenter Core"},
+      {"Windows 10 ENTERPRISEN", "Windows 10 Enterprise N"},
+      {"Windows 10 PROFESSIONALKN", "Windows 10 Professional KN"},
+      {"Windows 10 PROFESSIONALK", "Windows 10 Professional K"},
+      {"Windows 10 ENTERPRISE_N_2016_LTSB", "Windows 10 Enterprise N 2016 LTSB"},
+      {"Windows 10 ENTERPRISE_LTSC_2019", "Windows 10 Enterprise LTSC 2019"},
+      {"Windows 10 PROFESSIONAL_N_for_Workstations",
+       "Windows 10 Professional N for Workstations"},
+      {"Windows 8 Pro", "Windows 8 Pro"},
+      {"Windows 8.1 Home_China", "Windows 8.1 Home Chinese"},
+      {"Windows 10 Home_Single_Language", "Windows 10 Home Single Language"},
+      // "SERVERSTANDARDA" finds CORE; the later "SERVERSTANDARD" finds no
+      // modifier for "ACORE" and keeps it.
+      {"Windows Server 2008 R2 SERVERSTANDARDACORE", "Windows Server 2008 R2 Standard Core"},
+      {"Windows Server 2008 R2 SERVERDATACENTERAVCORE",
+       "Windows Server 2008 R2 Datacenter Core without Hyper-V"},
+      // A key followed by an unknown rest still names the edition.
+      {"Windows 7 ULTIMATEXYZ", "Windows 7 Ultimate"},
+      {"Windows Server 2012 SERVERSOLUTION", "Windows Server 2012 Essentials"},
+      {"Windows Server 2008 R2 SERVERWEBCORE", "Windows Server 2008 R2 Web Edition Core"},
+      // Unchanged: no edition key, no space, prefix that is not exact.
+      {"Windows 7 ultimate", "Windows 7 ultimate"},
+      {"Windows 7 CUSTOM", "Windows 7 CUSTOM"},
+      {"ULTIMATE", "ULTIMATE"},
+      {"", ""},
+      {"Windows Longhorn ", "Windows Longhorn "},
+      {"windows longhorn SERVERWEB", "windows longhorn Web Edition"},
+  };
+  for (const auto &c : cases) {
+    char *pretty = AutoInstall_GetPrettyWindowsName(c.raw);
+    ASSERT_NE(nullptr, pretty) << c.raw;
+    EXPECT_STREQ(c.pretty, pretty) << c.raw;
+    std::free(pretty);
+  }
+  EXPECT_EQ(nullptr, AutoInstall_GetPrettyWindowsName(nullptr));
+}
+
+}  // namespace

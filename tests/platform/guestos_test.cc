@@ -1,0 +1,199 @@
+#include "platform/guestos.h"
+
+#include <gtest/gtest.h>
+
+#include <set>
+#include <string>
+#include <vector>
+
+namespace {
+
+// Every identifier the recognisers emit, plus those the Linux classifier and
+// the Windows answer-file code read. Each must be known to the table.
+const char *const kEmitted[] = {
+    "win95", "win98", "winMe", "winNT", "win2000Pro", "win2000Serv", "win2000AdvServ",
+    "winXPHome", "winXPPro", "winXPPro-64", "winNetWeb", "winNetStandard", "winNetStandard-64",
+    "winNetEnterprise", "winNetEnterprise-64", "winNetBusiness", "winVista", "winVista-64",
+    "longhorn", "longhorn-64", "windows7", "windows7-64", "windows7srv-64", "windows8",
+    "windows8-64", "windows8srv-64", "winHyperV", "windows9", "windows9-64", "arm-windows9-64",
+    "windows9srv-64", "windows2019srv-64", "windows2019srvNext-64", "windows11-64",
+    "arm-windows11-64",
+    "rhel2", "redhat", "rhel3", "rhel3-64", "rhel4", "rhel4-64", "rhel5", "rhel5-64", "rhel6",
+    "rhel6-64", "rhel7", "rhel7-64", "rhel8-64", "centos", "centos-64", "centos6", "centos6-64",
+    "centos7-64", "centos8-64", "oraclelinux", "oraclelinux-64", "oraclelinux6",
+    "oraclelinux6-64", "oraclelinux7-64", "oraclelinux8-64", "asianux3", "asianux3-64",
+    "asianux4", "asianux4-64", "asianux7-64", "Fedora", "Fedora-64", "arm-Fedora-64",
+    "debian4", "debian4-64", "debian5", "debian5-64", "debian6", "debian6-64", "debian7",
+    "debian7-64", "debian8", "debian8-64", "debian9", "debian9-64", "debian10", "debian10-64",
+    "arm-debian10-64", "debian11", "debian11-64", "arm-debian11-64", "ubuntu", "ubuntu-64",
+    "arm-ubuntu-64", "suse", "suse-64", "opensuse", "opensuse-64", "sles", "sles-64", "sles10",
+    "sles10-64", "sles11", "sles11-64", "sles12", "sles12-64", "sles15-64", "nld9", "sjds",
+    "mandrake", "mandriva", "mandriva-64", "turbolinux", "tarvex-lumen-64",
+    "arm-tarvex-lumen-64", "solaris7", "solaris8", "solaris9", "solaris10", "solaris10-64",
+    "solaris11-64", "freeBSD", "freeBSD-64", "freeBSD11", "freeBSD11-64", "freeBSD12",
+    "freeBSD12-64", "freeBSD13", "freeBSD13-64", "freeBSD14-64", "arm-freeBSD13-64",
+    "arm-freeBSD14-64", "netware5", "netware6", "darwin", "darwin-64", "darwin10",
+    "darwin10-64", "darwin11", "darwin11-64", "zelcore", "zelcore5", "zelcore6", "zelcore65",
+    "zelcore7",
+};
+
+TEST(GuestOS, EveryEmittedIdentifierIsKnownAndRoundTrips) {
+  std::set<GuestOSID> seen;
+  for (const char *name : kEmitted) {
+    GuestOSID id = GuestOS_GetOSIDByName(name);
+    ASSERT_NE(id, GUESTOS_ID_UNKNOWN) << name;
+    EXPECT_STREQ(GuestOS_GetNameByOSID(id), name);
+    EXPECT_TRUE(seen.insert(id).second) << name << " shares id " << id;
+  }
+  std::set<GuestOSID> all;
+  for (size_t i = 0; i < GuestOS_TableSize(); i++) {
+    EXPECT_TRUE(all.insert(GuestOS_TableId(i)).second) << "duplicate id in row " << i;
+  }
+}
+
+TEST(GuestOS, NamesCompareWithoutCase) {
+  EXPECT_EQ(GuestOS_GetOSIDByName("WINXPPRO"), GuestOS_GetOSIDByName("winXPPro"));
+  EXPECT_EQ(GuestOS_GetOSIDByName("fedora-64"), GuestOS_GetOSIDByName("Fedora-64"));
+  EXPECT_EQ(GuestOS_GetOSIDByName("winXP"), GUESTOS_ID_UNKNOWN);  // a prefix is no name
+  EXPECT_EQ(GuestOS_GetOSIDByName(""), GUESTOS_ID_UNKNOWN);
+  EXPECT_EQ(GuestOS_GetOSIDByName(nullptr), GUESTOS_ID_UNKNOWN);
+  EXPECT_EQ(GuestOS_GetNameByOSID(GUESTOS_ID_UNKNOWN), nullptr);
+}
+
+// The tools-image family table's ranges; an id must never land in another
+// family's range (Arm and newer guests may be in none).
+enum Range { kNoRange, kWinPre2k, kWindows, kNoTools, kLinux, kSolaris, kFreeBSD, kNetware, kDarwin };
+
+Range RangeOf(GuestOSID id) {
+  struct {
+    GuestOSID lo, hi;
+    Range range;
+  } const rows[] = {
+      {20483, 20486, kWinPre2k}, {20486, 20513, kWindows}, {20595, 20602, kNoTools},
+      {20517, 20535, kLinux},    {20539, 20550, kLinux},   {20603, 20632, kLinux},
+      {20566, 20571, kSolaris},  {20551, 20565, kFreeBSD}, {20592, 20594, kNetware},
+      {20572, 20589, kDarwin},
+  };
+  for (const auto &r : rows) {
+    if (id >= r.lo && id <= r.hi) return r.range;
+  }
+  return kNoRange;
+}
+
+TEST(GuestOS, EveryIdFallsIntoItsFamilyRange) {
+  for (size_t i = 0; i < GuestOS_TableSize(); i++) {
+    GuestOSID id = GuestOS_TableId(i);
+    std::string name = GuestOS_GetNameByOSID(id);
+    bool arm = name.rfind("arm-", 0) == 0;
+    Range r = RangeOf(id);
+    if (arm) {
+      EXPECT_EQ(r, kNoRange) << name << ": an x86 tools image would be offered";
+      continue;
+    }
+    switch (r) {
+      case kWinPre2k: EXPECT_TRUE(GuestOS_IsWin9x(id) || GuestOS_IsWinNT4(id)) << name; break;
+      case kWindows: EXPECT_TRUE(GuestOS_IsWin2kOrHigher(id)) << name; break;
+      case kNoTools: EXPECT_TRUE(GuestOS_IsOrka(id) || name == "winHyperV") << name; break;
+      case kLinux: EXPECT_TRUE(GuestOS_IsLinux(id)) << name; break;
+      case kSolaris: EXPECT_TRUE(GuestOS_IsSolaris(id)) << name; break;
+      case kFreeBSD: EXPECT_TRUE(GuestOS_IsFreeBSD(id)) << name; break;
+      case kNetware: EXPECT_TRUE(GuestOS_IsNetware(id)) << name; break;
+      case kDarwin: EXPECT_TRUE(GuestOS_IsDarwin(id)) << name; break;
+      case kNoRange:  // newer guests: the signed image map names their image
+        break;
+    }
+  }
+  // The classic guests must keep their family image.
+  EXPECT_EQ(RangeOf(GuestOS_GetOSIDByName("winNT")), kWinPre2k);
+  EXPECT_EQ(RangeOf(GuestOS_GetOSIDByName("windows9-64")), kWindows);
+  EXPECT_EQ(RangeOf(GuestOS_GetOSIDByName("ubuntu-64")), kLinux);
+  EXPECT_EQ(RangeOf(GuestOS_GetOSIDByName("centos7-64")), kLinux);
+  EXPECT_EQ(RangeOf(GuestOS_GetOSIDByName("solaris10-64")), kSolaris);
+  EXPECT_EQ(RangeOf(GuestOS_GetOSIDByName("freeBSD13-64")), kFreeBSD);
+  EXPECT_EQ(RangeOf(GuestOS_GetOSIDByName("netware6")), kNetware);
+  EXPECT_EQ(RangeOf(GuestOS_GetOSIDByName("darwin11-64")), kDarwin);
+  EXPECT_EQ(RangeOf(GuestOS_GetOSIDByName("zelcore7")), kNoTools);
+}
+
+enum Pred {
+  k64 = 1 << 0, kWin = 1 << 1, k9x = 1 << 2, kNT4 = 1 << 3, k2k = 1 << 4, k2kUp = 1 << 5,
+  kVista = 1 << 6, kVistaUp = 1 << 7, k8C = 1 << 8, k8S = 1 << 9, k10C = 1 << 10,
+  k10S = 1 << 11, k11C = 1 << 12, k11S = 1 << 13, kLin = 1 << 14, kOldLibc = 1 << 15,
+  kSol = 1 << 16, kNw = 1 << 17, kMac = 1 << 18, kMac15 = 1 << 19, kBsd = 1 << 20,
+  kOrka = 1 << 21,
+};
+
+unsigned Predicates(GuestOSID id) {
+  Bool (*const fns[])(GuestOSID) = {
+      GuestOS_Is64Bit, GuestOS_IsWin, GuestOS_IsWin9x, GuestOS_IsWinNT4, GuestOS_IsWin2k,
+      GuestOS_IsWin2kOrHigher, GuestOS_IsWinVista, GuestOS_IsWinVistaOrHigher,
+      GuestOS_IsWinEightClient, GuestOS_IsWinEightServer, GuestOS_IsWinTenClient,
+      GuestOS_IsWinTenServer, GuestOS_IsWinElevenClient, GuestOS_IsWinElevenServer,
+      GuestOS_IsLinux, GuestOS_IsLinuxPreGlibc25, GuestOS_IsSolaris, GuestOS_IsNetware,
+      GuestOS_IsDarwin, GuestOS_IsDarwin15OrHigher, GuestOS_IsFreeBSD, GuestOS_IsOrka,
+  };
+  unsigned bits = 0;
+  for (size_t i = 0; i < sizeof fns / sizeof fns[0]; i++) {
+    if (fns[i](id)) bits |= 1u << i;
+  }
+  return bits;
+}
+
+TEST(GuestOS, PredicatesFollowTheFamilies) {
+  struct Case {
+    const char *name;
+    unsigned want;
+  } cases[] = {
+      {"win95", kWin | k9x},
+      {"winMe", kWin | k9x},
+      {"winNT", kWin | kNT4},
+      {"win2000AdvServ", kWin | k2k | k2kUp},
+      {"winXPPro-64", kWin | k2kUp | k64},
+      {"winNetEnterprise", kWin | k2kUp},
+      {"winVista", kWin | k2kUp | kVista | kVistaUp},
+      {"longhorn-64", kWin | k2kUp | kVista | kVistaUp | k64},
+      {"windows7", kWin | k2kUp | kVistaUp},
+      {"windows8-64", kWin | k2kUp | kVistaUp | k8C | k64},
+      {"windows8srv-64", kWin | k2kUp | kVistaUp | k8S | k64},
+      {"windows9", kWin | k2kUp | kVistaUp | k10C},
+      {"arm-windows9-64", kWin | k2kUp | kVistaUp | k10C | k64},
+      {"windows9srv-64", kWin | k2kUp | kVistaUp | k10S | k64},
+      {"windows2019srv-64", kWin | k2kUp | kVistaUp | k10S | k64},
+      {"windows2019srvNext-64", kWin | k2kUp | kVistaUp | k11S | k64},
+      {"windows11-64", kWin | k2kUp | kVistaUp | k11C | k64},
+      {"rhel4", kLin | kOldLibc},
+      {"rhel5-64", kLin | k64},
+      {"debian4-64", kLin | kOldLibc | k64},
+      {"ubuntu", kLin},
+      {"arm-ubuntu-64", kLin | k64},
+      {"sles", kLin | kOldLibc},
+      {"sles15-64", kLin | k64},
+      {"solaris10", kSol},
+      {"solaris11-64", kSol | k64},
+      {"netware6", kNw},
+      {"darwin11-64", kMac | k64},
+      {"darwin15-64", kMac | kMac15 | k64},
+      {"freeBSD", kBsd},
+      {"arm-freeBSD14-64", kBsd | k64},
+      {"zelcore65", kOrka | k64},
+  };
+  for (const auto &c : cases) {
+    GuestOSID id = GuestOS_GetOSIDByName(c.name);
+    ASSERT_NE(id, GUESTOS_ID_UNKNOWN) << c.name;
+    EXPECT_EQ(Predicates(id), c.want) << c.name;
+  }
+  EXPECT_EQ(Predicates(GUESTOS_ID_UNKNOWN), 0u);
+  EXPECT_EQ(Predicates(20480), 0u);
+}
+
+TEST(GuestOS, SixtyFourBitFollowsTheNameSuffix) {
+  for (size_t i = 0; i < GuestOS_TableSize(); i++) {
+    GuestOSID id = GuestOS_TableId(i);
+    std::string name = GuestOS_GetNameByOSID(id);
+    bool suffix = name.size() > 3 && name.compare(name.size() - 3, 3, "-64") == 0;
+    if (GuestOS_IsOrka(id) || name == "winHyperV") continue;  // 64-bit only, no suffix
+    EXPECT_EQ(GuestOS_Is64Bit(id) != 0, suffix) << name;
+  }
+}
+
+}  // namespace
