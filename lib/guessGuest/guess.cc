@@ -98,6 +98,8 @@ using Recogniser = Bool (*)(GuessMedium *, GuessResult *);
 constexpr Recogniser kSequence[] = {
     Guess_WindowsNT,
     Guess_WindowsLegacy,
+    Guess_WindowsVistaAndNewer,
+    Guess_RedHat,
     Guess_Mandriva,
     Guess_Debian,
     Guess_SUSE,
