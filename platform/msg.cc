@@ -103,11 +103,11 @@ std::string FormatV(const std::string &fmt, va_list args) {
 
 // LocalisedFormat is the format text Msg_Format uses: a malformed id text is
 // formatted as it stands.
-std::string LocalisedFormat(const char *idFmt) {
+std::string LocalisedFormat(const char *idFmt, bool english = false) {
   std::string id;
   const char *dflt = nullptr;
   if (!Split(idFmt, &id, &dflt)) return idFmt;
-  return Localise(id, dflt);
+  return english ? std::string(dflt) : Localise(id, dflt);
 }
 
 }  // namespace
@@ -126,6 +126,10 @@ char *Msg_GetStringSafe(const char *idFmt) {
 }
 
 char *Msg_VFormat(const char *idFmt, va_list args) { return Dup(FormatV(LocalisedFormat(idFmt), args)); }
+
+char *MsgEnglish_VFormat(const char *idFmt, va_list args) {
+  return Dup(FormatV(LocalisedFormat(idFmt, true), args));
+}
 
 char *Msg_Format(const char *idFmt, ...) {
   va_list args;

@@ -27,8 +27,11 @@ char *Msg_VFormat(const char *idFmt, va_list args);
 // null) and clears the list. A malformed id text is formatted as it stands.
 void Msg_Append(const char *idFmt, ...);
 char *Msg_GetMessagesAndReset(void);
-// Msg_LoadCatalogue loads a catalogue (dictionary format: id = "text") for
-// the given locale; Msg_SetLocale selects the current locale ("" or "en"
-// means defaults only). Process-wide; call before using the library.
+// Msg_LoadCatalogue loads a catalogue (dictionary format, see
+// docs/dictionary-format.md: id = "text") for the given locale, replacing an
+// earlier one; FALSE (with the reason on the pending list) when the file
+// cannot be read or is malformed, or for the default locale. Msg_SetLocale
+// selects the current locale ("" or "en" means defaults only). Process-wide;
+// call before using the library.
 Bool Msg_LoadCatalogue(const char *locale, const char *path);
 void Msg_SetLocale(const char *locale);

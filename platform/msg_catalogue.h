@@ -2,6 +2,7 @@
 // dictionary loader (which posts its refusals to the pending list).
 #pragma once
 
+#include <cstdarg>
 #include <map>
 #include <string>
 #include <vector>
@@ -14,3 +15,6 @@ void MsgPending_Add(std::string text);
 std::string MsgPending_Join(const std::vector<std::string> &messages);
 // MsgCatalogue_Install replaces the catalogue of `locale`.
 void MsgCatalogue_Install(const std::string &locale, std::map<std::string, std::string> texts);
+// MsgEnglish_VFormat is Msg_VFormat with the default (English) text,
+// whatever the locale.
+char *MsgEnglish_VFormat(const char *idFmt, va_list args);

@@ -35,6 +35,15 @@ static void TestBase(void) {
   Tvx_SetLogSink(NULL, NULL);
 }
 
+static void TestUdf(void) {
+  phase = "udf_open_missing";
+  CHECK(UDF_Open("/nonexistent/tvx-udf-test.iso") == NULL);
+  CHECK(UDF_OpenWithReader(NULL, NULL, NULL) == NULL);
+  CHECK(UDF_CloseDir(NULL) == FALSE);
+  CHECK(UDF_GetVolumeId(NULL) == NULL);
+  UDF_Close(NULL);
+}
+
 /* Writes through the INI calls into a temporary file and reads back. */
 static void TestIni(void) {
   char path[] = "/tmp/tvx_c_api_ini_XXXXXX";
@@ -87,6 +96,7 @@ static void TestAutoInstall(void) {
 
 int main(void) {
   TestBase();
+  TestUdf();
   TestIni();
   TestAutoInstall();
   if (failures == 0) printf("c_api: all phases passed\n");

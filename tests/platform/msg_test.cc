@@ -5,6 +5,8 @@
 #include <cstdlib>
 #include <string>
 
+#include "support/log_capture.h"
+
 namespace {
 
 std::string Take(char *s) {
@@ -41,6 +43,51 @@ TEST(Msg, PendingMessagesJoinAndReset) {
   Msg_Append("second");
   EXPECT_EQ(Take(Msg_GetMessagesAndReset()), "line 3: bad; second");
   EXPECT_EQ(Take(Msg_GetMessagesAndReset()), "");
+}
+
+}  // namespace
+
+namespace {
+
+TEST(MsgCatalogue, LocaleHitMissAndFaultyTranslations) {
+  tvxtest::TempDir t;
+  std::string path = t.Join("fr.txt");
+  tvxtest::WriteFileOrDie(path,
+                          "# French\n"
+                          "msg.guessGuest.ubuntuServer = \"Serveur\"\n"
+                          "msg.count = \"%d sur %s\"\n"
+                          "msg.swapped = \"%s sur %d\"\n");
+  ASSERT_TRUE(Msg_LoadCatalogue("fr", path.c_str()));
+  Msg_SetLocale("fr");
+  struct Case {
+    const char *id;
+    std::string want;
+  } cases[] = {
+      {"@&!*@*@(msg.guessGuest.ubuntuServer)Server", "Serveur"},
+      {"@&!*@*@(msg.guessGuest.sledDesktop)Desktop", "Desktop"},  // not translated
+      {"@&!*@*@(msg.unclosed Server", "<null>"},
+  };
+  for (const auto &c : cases) EXPECT_EQ(Take(Msg_GetString(c.id)), c.want) << c.id;
+  EXPECT_EQ(Take(Msg_Format("@&!*@*@(msg.count)%d of %s", 3, "five")), "3 sur five");
+  // A translation whose conversions differ would read the wrong arguments.
+  EXPECT_EQ(Take(Msg_Format("@&!*@*@(msg.swapped)%d of %s", 3, "five")), "3 of five");
+  Msg_SetLocale("de");  // no catalogue: defaults
+  EXPECT_EQ(Take(Msg_GetString("@&!*@*@(msg.guessGuest.ubuntuServer)Server")), "Server");
+  Msg_SetLocale("");
+  EXPECT_EQ(Take(Msg_GetString("@&!*@*@(msg.guessGuest.ubuntuServer)Server")), "Server");
+}
+
+TEST(MsgCatalogue, MalformedCatalogueIsRefusedWithItsLine) {
+  tvxtest::TempDir t;
+  std::string path = t.Join("bad.txt");
+  tvxtest::WriteFileOrDie(path, "msg.a = \"ok\"\nmsg.b \"no equals\"\n");
+  Take(Msg_GetMessagesAndReset());
+  EXPECT_FALSE(Msg_LoadCatalogue("xx", path.c_str()));
+  EXPECT_EQ(Take(Msg_GetMessagesAndReset()),
+            "cannot load message catalogue \"" + path + "\": line 2: \"=\" expected after \"msg.b\"");
+  Msg_SetLocale("xx");
+  EXPECT_EQ(Take(Msg_GetString("@&!*@*@(msg.a)default")), "default");
+  Msg_SetLocale("");
 }
 
 }  // namespace

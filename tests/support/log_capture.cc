@@ -34,9 +34,15 @@ static std::string Env(const char *name, const char *fallback) {
   return v != nullptr ? v : fallback;
 }
 
-std::string SourceDir() { return Env("TVX_SOURCE_DIR", "."); }
-std::string MediaDir() { return Env("TVX_MEDIA_DIR", "test-media"); }
-std::string ToolPath() { return Env("TVX_TOOL", "tvxguest"); }
+#ifndef TVX_TEST_SOURCE_DIR
+#define TVX_TEST_SOURCE_DIR "."
+#define TVX_TEST_MEDIA_DIR "test-media"
+#define TVX_TEST_TOOL "tvxguest"
+#endif
+
+std::string SourceDir() { return Env("TVX_SOURCE_DIR", TVX_TEST_SOURCE_DIR); }
+std::string MediaDir() { return Env("TVX_MEDIA_DIR", TVX_TEST_MEDIA_DIR); }
+std::string ToolPath() { return Env("TVX_TOOL", TVX_TEST_TOOL); }
 
 TempDir::TempDir() {
   std::string tmpl = (std::filesystem::temp_directory_path() / "tvxtest-XXXXXX").string();

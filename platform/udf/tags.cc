@@ -1,0 +1,119 @@
+// Descriptor tags and OSTA CS0 text: the two encodings every UDF structure
+// shares.
+#include <array>
+
+#include "platform/udf/udf_internal.h"
+
+namespace tvx::udf {
+
+const char *StatusText(Status s) {
+  switch (s) {
+    case Status::kOk: return "ok";
+    case Status::kNotUdf: return "no UDF anchor";
+    case Status::kIo: return "read error";
+    case Status::kCorrupt: return "corrupt structure";
+    case Status::kUnsupported: return "unsupported structure";
+    case Status::kNotFound: return "not found";
+    case Status::kNotDir: return "not a directory";
+    case Status::kIsDir: return "is a directory";
+    case Status::kLoop: return "loop";
+    case Status::kTooLarge: return "too large";
+  }
+  return "unknown";
+}
+
+namespace {
+
+constexpr std::array<uint16_t, 256> MakeCrcTable() {
+  std::array<uint16_t, 256> t{};
+  for (unsigned i = 0; i < 256; i++) {
+    unsigned c = i << 8;
+    for (int b = 0; b < 8; b++) c = (c & 0x8000) ? ((c << 1) ^ 0x1021) : (c << 1);
+    t[i] = static_cast<uint16_t>(c);
+  }
+  return t;
+}
+
+constexpr std::array<uint16_t, 256> kCrcTable = MakeCrcTable();
+
+void AppendUtf8(uint32_t cp, std::string *out) {
+  if (cp < 0x80) {
+    out->push_back(static_cast<char>(cp));
+  } else if (cp < 0x800) {
+    out->push_back(static_cast<char>(0xC0 | (cp >> 6)));
+    out->push_back(static_cast<char>(0x80 | (cp & 0x3F)));
+  } else if (cp < 0x10000) {
+    out->push_back(static_cast<char>(0xE0 | (cp >> 12)));
+    out->push_back(static_cast<char>(0x80 | ((cp >> 6) & 0x3F)));
+    out->push_back(static_cast<char>(0x80 | (cp & 0x3F)));
+  } else {
+    out->push_back(static_cast<char>(0xF0 | (cp >> 18)));
+    out->push_back(static_cast<char>(0x80 | ((cp >> 12) & 0x3F)));
+    out->push_back(static_cast<char>(0x80 | ((cp >> 6) & 0x3F)));
+    out->push_back(static_cast<char>(0x80 | (cp & 0x3F)));
+  }
+}
+
+}  // namespace
+
+uint16_t Crc16(const uint8_t *data, size_t len) {
+  uint16_t crc = 0;
+  for (size_t i = 0; i < len; i++) {
+    crc = static_cast<uint16_t>((crc << 8) ^ kCrcTable[((crc >> 8) ^ data[i]) & 0xFF]);
+  }
+  return crc;
+}
+
+Status CheckTag(const uint8_t *buf, size_t len, uint16_t want, uint32_t location) {
+  if (len < kTagSize) return Status::kCorrupt;
+  uint8_t sum = 0;
+  for (size_t i = 0; i < kTagSize; i++) {
+    if (i != 4) sum = static_cast<uint8_t>(sum + buf[i]);
+  }
+  if (sum != buf[4]) return Status::kCorrupt;
+  uint16_t id = Le16(buf);
+  if (want != 0 && id != want) return Status::kCorrupt;
+  uint16_t crcLen = Le16(buf + 10);
+  if (crcLen > len - kTagSize) return Status::kCorrupt;
+  if (Crc16(buf + kTagSize, crcLen) != Le16(buf + 8)) return Status::kCorrupt;
+  if (location != UINT32_MAX && Le32(buf + 12) != location) return Status::kCorrupt;
+  return Status::kOk;
+}
+
+bool DecodeCs0(const uint8_t *p, size_t len, std::string *out) {
+  out->clear();
+  if (len == 0) return true;
+  uint8_t comp = p[0];
+  if (comp == 8 || comp == 254) {
+    for (size_t i = 1; i < len; i++) AppendUtf8(p[i], out);
+    return true;
+  }
+  if (comp != 16 && comp != 255) return false;
+  // A trailing odd byte cannot be a character; it is dropped.
+  for (size_t i = 1; i + 1 < len; i += 2) {
+    uint32_t u = (static_cast<uint32_t>(p[i]) << 8) | p[i + 1];
+    if (u >= 0xD800 && u <= 0xDBFF && i + 3 < len) {
+      uint32_t lo = (static_cast<uint32_t>(p[i + 2]) << 8) | p[i + 3];
+      if (lo >= 0xDC00 && lo <= 0xDFFF) {
+        AppendUtf8(0x10000 + ((u - 0xD800) << 10) + (lo - 0xDC00), out);
+        i += 2;
+        continue;
+      }
+    }
+    if (u >= 0xD800 && u <= 0xDFFF) u = 0xFFFD;
+    AppendUtf8(u, out);
+  }
+  return true;
+}
+
+std::string DecodeDstring(const uint8_t *p, size_t fieldLen) {
+  std::string s;
+  if (fieldLen < 2) return s;
+  size_t used = p[fieldLen - 1];
+  if (used > fieldLen - 1) used = fieldLen - 1;
+  if (!DecodeCs0(p, used, &s)) s.clear();
+  while (!s.empty() && s.back() == '\0') s.pop_back();
+  return s;
+}
+
+}  // namespace tvx::udf

@@ -1,0 +1,403 @@
+// The answer files of each Windows family, made from the project's own
+// templates under data/windows and read back through XPath and INI reads.
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <cstdlib>
+#include <filesystem>
+#include <string>
+#include <vector>
+
+#include "lib/guestInstall/unattend_xml_support.h"
+#include "support/log_capture.h"
+#include "tvx_autoinstall_windows.h"
+#include "tvx_ini.h"
+
+namespace {
+
+using tvxtest::UnattendXml;
+
+constexpr char kFn[] = "AutoInstall_PrepareAnswerFileEx: ";
+constexpr char kScript[] = "%TEMP%\\unattend.cmd";
+constexpr char kPowerPlan[] = "powercfg -setactive 8c5e7fda-e8bf-4a96-9a85-a6e23a8c635c";
+constexpr char kPasswordAge[] = "net accounts /MAXPWAGE:UNLIMITED";
+constexpr char kNoAutoLogon[] =
+    "reg add \"HKLM\\SOFTWARE\\Microsoft\\Windows NT\\CurrentVersion\\Winlogon\" /v "
+    "AutoAdminLogon /t REG_SZ /d 0 /f";
+constexpr char kHelpSticker[] =
+    "reg.exe add HKLM\\Software\\Policies\\Microsoft\\Windows\\EdgeUI /v DisableHelpSticker /t "
+    "REG_DWORD /d 1";
+constexpr char kKeyElement[] = TVXTEST_PE_SETUP "/urn:UserData/urn:ProductKey";
+constexpr char kKeyValue[] = TVXTEST_PE_SETUP "/urn:UserData/urn:ProductKey/urn:Key";
+constexpr char kImageSource[] = TVXTEST_PE_SETUP "/urn:ImageInstall/urn:OSImage/urn:InstallFrom";
+
+std::string Template(const char *name) { return tvxtest::SourceDir() + "/data/windows/" + name; }
+
+// The answers of one preparation; tests change what they are about.
+struct Answers {
+  std::string sif = Template("winnt.sif");
+  std::string xml = Template("autounattend.xml");
+  std::string storePwd = Template("storePwd.ini");  // empty: no storePwd.ini
+  const char *productKey = "AAAAA-BBBBB-CCCCC-DDDDD-EEEEE";
+  const char *fullName = "Jo & <Ann> \"O'Neil\" J\xC3\xBCrgen";
+  const char *password = "p&ss<w>rd\"'";
+  const char *guestOS = "windows9-64";
+  GuessVersion version = GUESS_VERSION_WINDOWS_10_PLAIN;
+  const char *language = nullptr;
+  const char *imageName = "Windows 10 Pro";
+  Bool autoLogon = TRUE;
+  Bool keepPartitions = FALSE;
+};
+
+class WindowsAnswers : public ::testing::Test {
+ protected:
+  void SetUp() override {
+    const char *tz = std::getenv("TZ");
+    if (tz != nullptr) oldTz_ = tz, hadTz_ = true;
+    setenv("TZ", "Europe/Berlin", 1);
+  }
+  void TearDown() override {
+    if (hadTz_) {
+      setenv("TZ", oldTz_.c_str(), 1);
+    } else {
+      unsetenv("TZ");
+    }
+  }
+
+  Bool Prepare(const Answers &a) {
+    return AutoInstall_PrepareAnswerFileEx(
+        a.sif.c_str(), a.xml.c_str(), a.storePwd.empty() ? nullptr : a.storePwd.c_str(),
+        a.productKey, a.fullName, a.password, a.guestOS, a.version, dir_.Path().c_str(),
+        a.language, a.imageName, a.autoLogon, a.keepPartitions);
+  }
+  std::string Sif(const char *section, const char *key) { return Ini("winnt.sif", section, key); }
+  std::string Ini(const char *file, const char *section, const char *key) {
+    char buf[1024] = "<absent>";
+    EXPECT_TRUE(IniUtil_GetIniFileString(dir_.Join(file).c_str(), section, key, buf, sizeof buf));
+    return buf;
+  }
+  std::string XmlPath() { return dir_.Join("autoun~0.xml"); }
+  std::vector<std::string> Commands(const UnattendXml &xml) {
+    std::vector<std::string> all = xml.Texts(TVXTEST_FIRST_LOGON "/urn:CommandLine");
+    if (!all.empty()) all.erase(all.begin());  // the template's own command
+    return all;
+  }
+
+  tvxtest::TempDir dir_;
+  std::string oldTz_;
+  bool hadTz_ = false;
+};
+
+enum class KeyOutcome { kRemoved, kKept, kSet, kEmpty };
+
+struct Family {
+  const char *label;
+  const char *guestOS;
+  GuessVersion version;
+  const char *imageName;
+  const char *productKey;
+  const char *firstCommand;
+  bool amd64;
+  KeyOutcome key;
+  bool imageSourceRemoved;
+  bool helpSticker;
+};
+
+const Family kFamilies[] = {
+    {"XP", "winXPPro", GUESS_VERSION_UNKNOWN, "Windows XP Professional", "K", kScript, false,
+     KeyOutcome::kRemoved, false, false},
+    {"Vista", "winVista", GUESS_VERSION_UNKNOWN, "Windows Vista ULTIMATE", "K", kScript, false,
+     KeyOutcome::kKept, false, false},
+    {"7", "windows7-64", GUESS_VERSION_UNKNOWN, "Windows 7 ULTIMATE", "K",
+     "%TEMP%\\unattend.cmd noInstallTools", true, KeyOutcome::kRemoved, false, false},
+    {"2008 R2", "windows7srv-64", GUESS_VERSION_UNKNOWN, "Windows Server 2008 R2 SERVERSTANDARD",
+     "K", "%TEMP%\\unattend.cmd noInstallTools", true, KeyOutcome::kRemoved, false, false},
+    {"8.1 trial", "windows8-64", GUESS_VERSION_WINDOWS_81_TRIAL, "Windows 8.1 Enterprise", "K",
+     kScript, true, KeyOutcome::kEmpty, false, true},
+    {"8.1 plain", "windows8-64", GUESS_VERSION_WINDOWS_81_PLAIN, "Windows 8.1 Pro", "K", kScript,
+     true, KeyOutcome::kSet, true, true},
+    {"8.1 plain, no key", "windows8-64", GUESS_VERSION_WINDOWS_81_PLAIN, "Windows 8.1 Pro", "",
+     kScript, true, KeyOutcome::kEmpty, false, true},
+    {"2012 R2", "windows8srv-64", GUESS_VERSION_WINDOWS_SERVER_2012_R2_PLAIN,
+     "Windows Server 2012 R2 SERVERSTANDARD", "K", "%TEMP%\\unattend.cmd noInstallTools", true,
+     KeyOutcome::kSet, false, false},
+    {"10 enterprise", "windows9-64", GUESS_VERSION_WINDOWS_10_ENTERPRISE,
+     "Windows 10 Enterprise", "K", kScript, true, KeyOutcome::kRemoved, false, false},
+    {"10 plain", "windows9-64", GUESS_VERSION_WINDOWS_10_PLAIN, "Windows 10 Pro", "K", kScript,
+     true, KeyOutcome::kSet, false, false},
+    {"10 plain, no key", "windows9-64", GUESS_VERSION_WINDOWS_10_PLAIN, "Windows 10 Pro", nullptr,
+     kScript, true, KeyOutcome::kEmpty, false, false},
+    {"Server 2016", "windows9srv-64", GUESS_VERSION_UNKNOWN, "Windows Server 2016 SERVERSTANDARD",
+     "K", "%TEMP%\\unattend.cmd noautoreboot", true, KeyOutcome::kSet, false, false},
+    {"Server 2019", "windows2019srv-64", GUESS_VERSION_UNKNOWN,
+     "Windows Server 2019 SERVERDATACENTER", "K", "%TEMP%\\unattend.cmd noautoreboot", true,
+     KeyOutcome::kSet, false, false},
+    {"Server 2022", "windows2019srvNext-64", GUESS_VERSION_UNKNOWN,
+     "Windows Server 2022 SERVERSTANDARDCORE", "K", "%TEMP%\\unattend.cmd noautoreboot", true,
+     KeyOutcome::kSet, false, false},
+};
+
+TEST_F(WindowsAnswers, EachFamilyGetsItsAnswerFiles) {
+  for (const Family &f : kFamilies) {
+    SCOPED_TRACE(f.label);
+    Answers a;
+    a.guestOS = f.guestOS;
+    a.version = f.version;
+    a.imageName = f.imageName;
+    a.productKey = f.productKey;
+    ASSERT_TRUE(Prepare(a));
+    ASSERT_TRUE(tvxtest::XmllintAccepts(XmlPath()));
+    UnattendXml xml(XmlPath());
+
+    std::vector<std::string> commands{f.firstCommand, kPowerPlan, kPasswordAge};
+    if (f.helpSticker) commands.push_back(kHelpSticker);
+    EXPECT_EQ(Commands(xml), commands);
+    EXPECT_EQ(xml.Count("//urn:component[@processorArchitecture='amd64']"), f.amd64 ? 6u : 0u);
+    switch (f.key) {
+      case KeyOutcome::kRemoved: EXPECT_EQ(xml.Count(kKeyElement), 0u); break;
+      case KeyOutcome::kKept: EXPECT_EQ(xml.Text(kKeyValue), ""); break;
+      case KeyOutcome::kSet: EXPECT_EQ(xml.Text(kKeyValue), f.productKey); break;
+      case KeyOutcome::kEmpty: EXPECT_EQ(xml.Text(kKeyValue), ""); break;
+    }
+    EXPECT_EQ(xml.Count(kImageSource), f.imageSourceRemoved ? 0u : 1u);
+    if (!f.imageSourceRemoved) {
+      EXPECT_EQ(xml.Text(kImageSource + std::string("/urn:MetaData/urn:Value")), f.imageName);
+    }
+    // Both generations always get their file.
+    EXPECT_TRUE(std::filesystem::exists(dir_.Join("winnt.sif")));
+    EXPECT_EQ(Sif("UserData", "ProductKey"), f.productKey == nullptr || *f.productKey == '\0'
+                                                 ? "<absent>"
+                                                 : f.productKey);
+  }
+}
+
+TEST_F(WindowsAnswers, UserAnswersArriveEscapedAndIntact) {
+  Answers a;
+  a.language = "de-DE";
+  ASSERT_TRUE(Prepare(a));
+  ASSERT_TRUE(tvxtest::XmllintAccepts(XmlPath()));
+  UnattendXml xml(XmlPath());
+  EXPECT_EQ(xml.Text(TVXTEST_OOBE "/urn:AutoLogon/urn:Username"), a.fullName);
+  EXPECT_EQ(xml.Text(TVXTEST_OOBE "/urn:UserAccounts/urn:LocalAccounts/urn:LocalAccount/urn:Name"),
+            a.fullName);
+  EXPECT_EQ(xml.Text(TVXTEST_OOBE "/urn:AutoLogon/urn:Password/urn:Value"), a.password);
+  EXPECT_EQ(xml.Text(TVXTEST_OOBE
+                     "/urn:UserAccounts/urn:LocalAccounts/urn:LocalAccount/urn:Password/urn:Value"),
+            a.password);
+  EXPECT_EQ(xml.Text(TVXTEST_OOBE "/urn:AutoLogon/urn:Enabled"), "true");
+  EXPECT_EQ(xml.Text(TVXTEST_OOBE "/urn:TimeZone"), "W. Europe Standard Time");
+  for (const char *locale : {"InputLocale", "SystemLocale", "UILanguage", "UserLocale"}) {
+    EXPECT_EQ(xml.Text(TVXTEST_PE_INTL "/urn:" + std::string(locale)), "de-DE") << locale;
+  }
+  // The whole disk: the sized partition goes, the rest becomes partition 1.
+  const std::string partitions =
+      TVXTEST_PE_SETUP "/urn:DiskConfiguration/urn:Disk/urn:CreatePartitions/urn:CreatePartition";
+  EXPECT_EQ(xml.Count(partitions), 1u);
+  EXPECT_EQ(xml.Count(partitions + "[urn:Size]"), 0u);
+  EXPECT_EQ(xml.Text(partitions + "/urn:Order"), "1");
+  EXPECT_EQ(xml.Text(TVXTEST_PE_SETUP "/urn:ImageInstall/urn:OSImage/urn:InstallTo/urn:PartitionID"),
+            "1");
+
+  // winnt.sif holds the same answers, quoted, in windows-1252, and the zone's index.
+  EXPECT_EQ(Sif("UserData", "FullName"), "Jo & <Ann> \"O'Neil\" J\xFCrgen");
+  EXPECT_EQ(Sif("GuiUnattended", "AdminPassword"), a.password);
+  EXPECT_EQ(Sif("GuiUnattended", "AutoLogon"), "Yes");
+  EXPECT_EQ(Sif("GuiUnattended", "AutoLogonCount"), "1");
+  EXPECT_EQ(Sif("GuiUnattended", "TimeZone"), "110");
+  EXPECT_EQ(Ini("storePwd.ini", "Autologon", "Enabled"), "1");
+}
+
+TEST_F(WindowsAnswers, OptionsChangeLogonAndDisk) {
+  Answers a;
+  a.autoLogon = FALSE;
+  a.keepPartitions = TRUE;
+  ASSERT_TRUE(Prepare(a));
+  UnattendXml xml(XmlPath());
+  EXPECT_EQ(Commands(xml),
+            (std::vector<std::string>{kScript, kPowerPlan, kPasswordAge, kNoAutoLogon}));
+  EXPECT_EQ(xml.Texts(TVXTEST_FIRST_LOGON "/urn:Order"),
+            (std::vector<std::string>{"1", "2", "3", "4", "5"}));
+  EXPECT_EQ(xml.Count(TVXTEST_PE_SETUP "//urn:CreatePartition[urn:Size]"), 1u);
+  EXPECT_EQ(xml.Text(TVXTEST_PE_SETUP "/urn:ImageInstall/urn:OSImage/urn:InstallTo/urn:PartitionID"),
+            "2");
+  EXPECT_EQ(Ini("storePwd.ini", "Autologon", "Enabled"), "0");
+}
+
+TEST_F(WindowsAnswers, WithoutPasswordNoLogonSettingsAreWritten) {
+  Answers a;
+  a.password = "";
+  a.fullName = nullptr;
+  a.autoLogon = FALSE;
+  ASSERT_TRUE(Prepare(a));
+  UnattendXml xml(XmlPath());
+  EXPECT_EQ(xml.Text(TVXTEST_OOBE "/urn:AutoLogon/urn:Enabled"), "false");
+  EXPECT_EQ(xml.Text(TVXTEST_OOBE "/urn:AutoLogon/urn:Username"), "Tarvex User");
+  EXPECT_EQ(Commands(xml), (std::vector<std::string>{kScript, kPowerPlan, kPasswordAge}));
+  EXPECT_EQ(Sif("GuiUnattended", "AutoLogon"), "<absent>");
+  EXPECT_EQ(Sif("GuiUnattended", "AutoLogonCount"), "<absent>");
+  // The template's own value stays.
+  EXPECT_EQ(Ini("storePwd.ini", "Autologon", "Enabled"), "1");
+}
+
+TEST_F(WindowsAnswers, DefaultLanguageDependsOnTheGeneration) {
+  struct Case {
+    const char *guestOS;
+    const char *locale;
+  };
+  for (const Case &c : {Case{"winXPPro", "English"}, Case{"winVista", "en-US"}}) {
+    Answers a;
+    a.guestOS = c.guestOS;
+    a.language = "";
+    ASSERT_TRUE(Prepare(a)) << c.guestOS;
+    UnattendXml xml(XmlPath());
+    EXPECT_EQ(xml.Text(TVXTEST_PE_INTL "/urn:UILanguage"), c.locale) << c.guestOS;
+  }
+}
+
+TEST_F(WindowsAnswers, WinntSifUsesTheLanguagesCodePage) {
+  struct Case {
+    const char *language;
+    const char *name;      // UTF-8
+    const char *password;  // UTF-8
+    const char *sifName;   // bytes expected in winnt.sif
+    const char *sifPassword;
+  };
+  const Case cases[] = {
+      {"Japanese", "\xE5\xB1\xB1\xE7\x94\xB0", "\xE6\x97\xA5\xE6\x9C\xAC", "\x8E\x52\x93\x63",
+       "\x93\xFA\x96\x7B"},
+      {"Russian", "\xD0\x98\xD0\xB2\xD0\xB0\xD0\xBD", "pw", "\xC8\xE2\xE0\xED", "pw"},
+      {"Korean", "\xED\x95\x9C\xEA\xB5\xAD", "pw", "\xC7\xD1\xB1\xB9", "pw"},
+      {"Simplified Chinese", "\xE4\xB8\xAD\xE6\x96\x87", "pw", "\xD6\xD0\xCE\xC4", "pw"},
+      {"Traditional Chinese", "\xE4\xB8\xAD\xE6\x96\x87", "pw", "\xA4\xA4\xA4\xE5", "pw"},
+      {"German", "J\xC3\xBCrgen", "\xE2\x82\xAC", "J\xFCrgen", "\x80"},
+      // Names are matched exactly: a lower-case language is the default.
+      {"japanese", "J\xC3\xBCrgen", "pw", "J\xFCrgen", "pw"},
+  };
+  for (const Case &c : cases) {
+    SCOPED_TRACE(c.language);
+    Answers a;
+    a.language = c.language;
+    a.fullName = c.name;
+    a.password = c.password;
+    tvxtest::LogCapture log;
+    ASSERT_TRUE(Prepare(a));
+    EXPECT_TRUE(log.Lines().empty()) << log.All();
+    EXPECT_EQ(Sif("UserData", "FullName"), c.sifName);
+    EXPECT_EQ(Sif("GuiUnattended", "AdminPassword"), c.sifPassword);
+    // The XML always gets UTF-8.
+    UnattendXml xml(XmlPath());
+    EXPECT_EQ(xml.Text(TVXTEST_OOBE "/urn:AutoLogon/urn:Username"), c.name);
+    EXPECT_EQ(xml.Text(TVXTEST_OOBE "/urn:AutoLogon/urn:Password/urn:Value"), c.password);
+  }
+}
+
+TEST_F(WindowsAnswers, UnconvertibleTextIsWrittenAsUtf8) {
+  Answers a;
+  a.language = "Russian";
+  a.fullName = "\xE5\xB1\xB1\xE7\x94\xB0";
+  a.password = "pw";
+  tvxtest::LogCapture log;
+  ASSERT_TRUE(Prepare(a));
+  EXPECT_EQ(log.Lines(), (std::vector<std::string>{std::string(kFn) +
+                                                   "Failed to perform conversion from UTF-8 to "
+                                                   "windows-1251\n"}));
+  EXPECT_EQ(Sif("UserData", "FullName"), a.fullName);
+}
+
+// Failures: the first failing step logs its line and ends the call; what was
+// copied before stays.
+TEST_F(WindowsAnswers, FailuresLogTheirStepAndStop) {
+  const std::string out = dir_.Path();
+  tvxtest::TempDir templates;
+  const std::string brokenSif = templates.Join("broken.sif");
+  tvxtest::WriteFileOrDie(brokenSif, "[UserData]\nFullName=x\n[Broken\n");
+  const std::string brokenIni = brokenSif + ".ini";
+  tvxtest::WriteFileOrDie(brokenIni, "[Autologon\n");
+  const std::string brokenXml = brokenSif + ".xml";
+  tvxtest::WriteFileOrDie(brokenXml, "<unattend><settings></unattend>\n");
+  const std::string missing = templates.Join("missing.sif");
+  const std::string sif = out + "/winnt.sif";
+  const std::string xml = out + "/autoun~0.xml";
+  const std::string ini = out + "/storePwd.ini";
+
+  struct Case {
+    const char *label;
+    void (*change)(Answers &, const std::string &sifT, const std::string &iniT,
+                   const std::string &xmlT, const std::string &missingT);
+    std::string log;
+    std::vector<std::string> files;  // left in the output directory
+  };
+  const Case cases[] = {
+      {"not Windows", [](Answers &a, auto &, auto &, auto &, auto &) { a.guestOS = "ubuntu-64"; },
+       "GuestOS_IsWin failed for guestID ubuntu-64\n", {}},
+      {"unknown guest", [](Answers &a, auto &, auto &, auto &, auto &) { a.guestOS = "winFoo"; },
+       "GuestOS_IsWin failed for guestID winFoo\n", {}},
+      {"no guest", [](Answers &a, auto &, auto &, auto &, auto &) { a.guestOS = nullptr; },
+       "GuestOS_IsWin failed for guestID (null)\n", {}},
+      {"sif template missing",
+       [](Answers &a, auto &, auto &, auto &, const std::string &m) { a.sif = m; },
+       "File_Copy from=\"" + missing + "\" to=\"" + sif + "\"\n", {}},
+      {"xml template missing",
+       [](Answers &a, auto &, auto &, auto &, const std::string &m) { a.xml = m; },
+       "File_Copy from=\"" + missing + "\" to=\"" + xml + "\"\n", {"winnt.sif"}},
+      {"storePwd template missing",
+       [](Answers &a, auto &, auto &, auto &, const std::string &m) { a.storePwd = m; },
+       "File_Copy from=\"" + missing + "\" to=\"" + ini + "\"\n",
+       {"autoun~0.xml", "winnt.sif"}},
+      {"product key not written",
+       [](Answers &a, const std::string &s, auto &, auto &, auto &) { a.sif = s; },
+       "IniUtil_WriteIniFileString unattendFilePath=\"" + sif +
+           "\", ProductKey=\"AAAAA-BBBBB-CCCCC-DDDDD-EEEEE\"\n",
+       {"autoun~0.xml", "storePwd.ini", "winnt.sif"}},
+      // The message names the text as the user gave it, not its conversion.
+      {"full name not written",
+       [](Answers &a, const std::string &s, auto &, auto &, auto &) {
+         a.sif = s, a.productKey = nullptr, a.language = "Russian", a.fullName = "\xD0\x98";
+       },
+       "IniUtil_WriteIniFileString unattendFilePath=\"" + sif + "\", FullName=\"\xD0\x98\"\n",
+       {"autoun~0.xml", "storePwd.ini", "winnt.sif"}},
+      {"password not written",
+       [](Answers &a, const std::string &s, auto &, auto &, auto &) {
+         a.sif = s, a.productKey = "", a.fullName = "";
+       },
+       "IniUtil_WriteIniFileString unattendFilePath=\"" + sif + "\", AdminPassword=\"p&ss<w>rd\"'\"\n",
+       {"autoun~0.xml", "storePwd.ini", "winnt.sif"}},
+      {"time zone not written",
+       [](Answers &a, const std::string &s, auto &, auto &, auto &) {
+         a.sif = s, a.productKey = nullptr, a.fullName = nullptr, a.password = nullptr;
+       },
+       "IniUtil_WriteIniFileInt unattendFilePath=\"" + sif + "\", TimeZone=110\n",
+       {"autoun~0.xml", "storePwd.ini", "winnt.sif"}},
+      // This one message has no line end.
+      {"logon setting not written",
+       [](Answers &a, auto &, const std::string &i, auto &, auto &) { a.storePwd = i; },
+       "IniUtil_WriteIniFileString storePwdIniPath=\"" + ini + "\"",
+       {"autoun~0.xml", "storePwd.ini", "winnt.sif"}},
+      {"xml unparsable",
+       [](Answers &a, auto &, auto &, const std::string &x, auto &) { a.xml = x; },
+       "AutoInstallEditUnattendXml failed for \"" + xml + "\"\n",
+       {"autoun~0.xml", "storePwd.ini", "winnt.sif"}},
+      {"name XML cannot hold",
+       [](Answers &a, auto &, auto &, auto &, auto &) { a.fullName = "tab\tok but bell\a not"; },
+       "AutoInstallEditUnattendXml failed for \"" + xml + "\"\n",
+       {"autoun~0.xml", "storePwd.ini", "winnt.sif"}},
+  };
+  for (const Case &c : cases) {
+    SCOPED_TRACE(c.label);
+    std::filesystem::remove_all(out);
+    std::filesystem::create_directory(out);
+    Answers a;
+    c.change(a, brokenSif, brokenIni, brokenXml, missing);
+    tvxtest::LogCapture log;
+    EXPECT_FALSE(Prepare(a));
+    EXPECT_EQ(log.Lines(), std::vector<std::string>{kFn + c.log});
+    std::vector<std::string> files;
+    for (const auto &e : std::filesystem::directory_iterator(out)) {
+      files.push_back(e.path().filename().string());
+    }
+    std::sort(files.begin(), files.end());
+    EXPECT_EQ(files, c.files);
+  }
+}
+
+}  // namespace

@@ -1,0 +1,259 @@
+#include "platform/dictionary.h"
+
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "platform/msg.h"
+#include "support/log_capture.h"
+
+namespace {
+
+using Entries = std::vector<std::pair<std::string, std::string>>;
+
+std::string Take(char *s) {
+  std::string out = s != nullptr ? s : "<null>";
+  std::free(s);
+  return out;
+}
+
+Entries All(const Dictionary *d) {
+  Entries out;
+  Dictionary_Iterate(
+      d,
+      [](const char *n, const char *v, void *ctx) -> Bool {
+        static_cast<Entries *>(ctx)->emplace_back(n, v);
+        return TRUE;
+      },
+      &out);
+  return out;
+}
+
+// Parse returns the entries, or the loader's message after "ERROR ".
+std::string Parse(const std::string &text, Entries *out) {
+  Dictionary *d = Dictionary_Create();
+  MsgList *msgs = nullptr;
+  std::string result;
+  if (Dictionary_LoadFromBufferEx(d, text.data(), text.size(), &msgs)) {
+    *out = All(d);
+    EXPECT_TRUE(MsgList_IsEmpty(msgs));
+  } else {
+    result = "ERROR " + Take(MsgList_ToEnglishString(msgs));
+    EXPECT_EQ(Dictionary_NumberOfEntries(d), 0u) << "a refused text must add nothing";
+  }
+  MsgList_Free(msgs);
+  Dictionary_Free(d);
+  return result;
+}
+
+TEST(Dictionary, ReadsQuotedBareCommentsAndBlankLines) {
+  struct Case {
+    std::string text;
+    Entries want;
+  } cases[] = {
+      {"a = \"1\"\nb=2\n", {{"a", "1"}, {"b", "2"}}},
+      {"# comment\n\n   \t\n  name  =  \"spaced value\"  # trailing\n", {{"name", "spaced value"}}},
+      {"v = 11.2.5#4\n", {{"v", "11.2.5#4"}}},
+      {"v = 10.0.0#3 , 9.4   \n", {{"v", "10.0.0#3 , 9.4"}}},
+      {"v = bare # comment\n", {{"v", "bare"}}},
+      {"v = #only a comment\n", {{"v", ""}}},
+      {"v =\n", {{"v", ""}}},
+      {"v = \"\"\n", {{"v", ""}}},
+      {"v = \"a#b\"\n", {{"v", "a#b"}}},
+      {"crlf = \"x\"\r\nnext = y\r\n", {{"crlf", "x"}, {"next", "y"}}},
+      {"\xEF\xBB\xBF" "bom = 1", {{"bom", "1"}}},
+      {"esc = \"q\\\" b\\\\ n\\n t\\t h\\x41\"", {{"esc", "q\" b\\ n\n t\t hA"}}},
+      {"a.version = 1\nA.VERSION = 2\n", {{"a.version", "1"}, {"A.VERSION", "2"}}},
+      {"arm-windows9-64 = \"windows.iso\"", {{"arm-windows9-64", "windows.iso"}}},
+      {"", {}},
+  };
+  for (const auto &c : cases) {
+    Entries got;
+    EXPECT_EQ(Parse(c.text, &got), "") << c.text;
+    EXPECT_EQ(got, c.want) << c.text;
+  }
+}
+
+TEST(Dictionary, RefusesMalformedLinesNamingTheLine) {
+  struct Case {
+    std::string text, message;
+  } cases[] = {
+      {"ok = 1\nno equals here\n", "line 2: \"=\" expected after \"no\""},
+      {"ok = 1\n\n# c\nname\n", "line 4: \"=\" expected after \"name\""},
+      {"= value\n", "line 1: an entry must start with a name"},
+      {"\"quoted\" = 1\n", "line 1: an entry must start with a name"},
+      {"a = \"open\n", "line 1: the quoted value has no closing quote"},
+      {"a = \"x\" y\n", "line 1: unexpected text after the closing quote"},
+      {"a = \"C:\\tools\\new\"\n", ""},  // \t and \n are escapes: accepted
+      {"a = \"C:\\Program\"\n", "line 1: unknown escape in a value"},
+      {"a = \"\\x00\"\n", "line 1: unknown escape in a value"},
+      {"a = \"\\x4\"\n", "line 1: unknown escape in a value"},
+      {"a = \"ends in \\", "line 1: the quoted value has no closing quote"},
+      {"a = half\"quoted\n", "line 1: a double quote inside an unquoted value"},
+      {"a = bell\x07\n", "line 1: control character in a value"},
+      {"a\x01 = 1\n", "line 1: control character in a name"},
+      {std::string("a = 1\nb = 2\0\n", 13), "line 2: NUL byte"},
+  };
+  for (const auto &c : cases) {
+    Entries got;
+    std::string r = Parse(c.text, &got);
+    EXPECT_EQ(r, c.message.empty() ? "" : "ERROR " + c.message) << c.text;
+  }
+}
+
+TEST(Dictionary, WrittenTextLoadsBackTheSameEntries) {
+  Dictionary *d = Dictionary_Create();
+  std::string tricky = "quote\" back\\slash\nnew\ttab\rcr\x01 # not a comment";
+  ASSERT_TRUE(Dict_SetString(d, tricky.c_str(), "%s.version", "odd"));
+  ASSERT_TRUE(Dict_SetString(d, "", "empty"));
+  ASSERT_TRUE(Dict_SetBool(d, TRUE, "flag"));
+  ASSERT_TRUE(Dict_SetLong(d, -42, "n"));
+  EXPECT_FALSE(Dict_SetString(d, "x", "bad name"));
+  EXPECT_FALSE(Dict_SetString(d, "x", "%s", ""));
+  size_t size = 0;
+  std::string text = Take(Dictionary_WriteToBuffer(d, &size));
+  EXPECT_EQ(text.size(), size);
+  Entries back;
+  ASSERT_EQ(Parse(text, &back), "");
+  EXPECT_EQ(back, All(d));
+  EXPECT_EQ(back[0].second, tricky);
+
+  tvxtest::TempDir t;
+  std::string path = t.Join("cfg.tvxx");
+  ASSERT_TRUE(Dictionary_WriteFile(d, path.c_str(), nullptr));
+  Dictionary *fromFile = Dictionary_Create();
+  ASSERT_TRUE(Dictionary_LoadEx(fromFile, path.c_str(), nullptr));
+  EXPECT_EQ(All(fromFile), All(d));
+  Dictionary_Free(fromFile);
+  Dictionary_Free(d);
+}
+
+TEST(Dictionary, LookupsSeeTheLastOccurrenceWithoutCase) {
+  Dictionary *d = Dictionary_Create();
+  const char text[] =
+      "guestOS = \"winXPPro\"\nvirtualHW.version = 19\nGUESTOS = ubuntu-64\n"
+      "installed = yes\nbad = 12x\n";
+  ASSERT_TRUE(Dictionary_LoadFromBuffer(d, text, sizeof text - 1));
+  EXPECT_EQ(Dictionary_NumberOfEntries(d), 5u);
+  EXPECT_EQ(Take(Dict_GetString(d, nullptr, "guestos")), "ubuntu-64");
+  EXPECT_EQ(Take(Dict_GetString(d, "/usr/lib/tarvex", "libdir")), "/usr/lib/tarvex");
+  EXPECT_EQ(Dict_GetString(d, nullptr, "libdir"), nullptr);
+  int32_t hw = 1;
+  EXPECT_TRUE(Dictionary_Get(d, "virtualHW.version", DICT_INT32, &hw));
+  EXPECT_EQ(hw, 19);
+  int32_t untouched = 7;
+  EXPECT_FALSE(Dictionary_Get(d, "bad", DICT_INT32, &untouched));
+  EXPECT_EQ(untouched, 7);
+  EXPECT_TRUE(Dict_GetBool(d, FALSE, "installed"));
+  EXPECT_TRUE(Dict_GetBool(d, TRUE, "bad"));  // not a bool: the default
+  EXPECT_EQ(Dict_GetLong(d, -1, "missing"), -1);
+
+  // Setting a repeated name leaves one entry holding the new value.
+  ASSERT_TRUE(Dict_SetString(d, "windows9-64", "GuestOS"));
+  EXPECT_EQ(Dictionary_NumberOfEntries(d), 4u);
+  EXPECT_EQ(Take(Dict_GetString(d, nullptr, "guestOS")), "windows9-64");
+  EXPECT_TRUE(Dictionary_Unset(d, "GUESTOS"));
+  EXPECT_FALSE(Dictionary_IsDefined(d, "guestOS"));
+  EXPECT_FALSE(Dictionary_Unset(d, "guestOS"));
+  Dictionary_Free(d);
+}
+
+TEST(Dictionary, IterateCountsVisitsSoAnEarlyStopShows) {
+  Dictionary *d = Dictionary_Create();
+  const char text[] = "a = 1\nb = 2\nc = 3\n";
+  ASSERT_TRUE(Dictionary_LoadFromBuffer(d, text, sizeof text - 1));
+  int calls = 0;
+  size_t visited = Dictionary_Iterate(
+      d, [](const char *, const char *, void *ctx) -> Bool { return ++*static_cast<int *>(ctx) < 2; },
+      &calls);
+  EXPECT_EQ(visited, 2u);
+  EXPECT_NE(visited, Dictionary_NumberOfEntries(d));
+  Dictionary_Free(d);
+}
+
+TEST(Dictionary, BufferLoadFailurePostsToPendingMessages) {
+  Take(Msg_GetMessagesAndReset());
+  Dictionary *d = Dictionary_Create();
+  const char text[] = "a = 1\nb\n";
+  EXPECT_FALSE(Dictionary_LoadFromBuffer(d, text, sizeof text - 1));
+  EXPECT_EQ(Take(Msg_GetMessagesAndReset()), "line 2: \"=\" expected after \"b\"");
+  Dictionary_Free(d);
+}
+
+TEST(Dictionary, FileLoadFailuresSayWhy) {
+  tvxtest::TempDir t;
+  Dictionary *d = Dictionary_Create();
+  MsgList *msgs = nullptr;
+  std::string missing = t.Join("missing.txt");
+  EXPECT_FALSE(Dictionary_LoadEx(d, missing.c_str(), &msgs));
+  EXPECT_EQ(Take(MsgList_ToEnglishString(msgs)),
+            "cannot open \"" + missing + "\": Could not find the file");
+  MsgList_Free(msgs);
+  msgs = nullptr;
+  EXPECT_FALSE(Dictionary_LoadEx(d, t.Path().c_str(), &msgs));  // a directory
+  EXPECT_FALSE(MsgList_IsEmpty(msgs));
+  MsgList_Free(msgs);
+  Dictionary_Free(d);
+}
+
+// Random texts over the format's special characters: the reader must never
+// crash, and whatever it accepts must survive a write and a re-read.
+TEST(Dictionary, RandomTextsNeverCrashAndAcceptedOnesRoundTrip) {
+  static const char kAlphabet[] = "ab =\"#\\\n\r\tx0\x01\xc3";
+  uint32_t state = 12345;
+  auto next = [&state] {
+    state = state * 1103515245u + 12345u;
+    return state >> 16;
+  };
+  int accepted = 0;
+  for (int round = 0; round < 3000; round++) {
+    std::string text;
+    size_t len = next() % 40;
+    for (size_t i = 0; i < len; i++) text += kAlphabet[next() % (sizeof kAlphabet - 1)];
+    Entries got;
+    if (!Parse(text, &got).empty()) continue;
+    accepted++;
+    Dictionary *loaded = Dictionary_Create();
+    ASSERT_TRUE(Dictionary_LoadFromBufferEx(loaded, text.data(), text.size(), nullptr));
+    std::string written = Take(Dictionary_WriteToBuffer(loaded, nullptr));
+    Entries again;
+    EXPECT_EQ(Parse(written, &again), "") << written;
+    EXPECT_EQ(again, got) << text;
+    Dictionary_Free(loaded);
+  }
+  EXPECT_GT(accepted, 100);
+}
+
+TEST(Dictionary, StringToBool) {
+  struct Case {
+    const char *text;
+    int whenDefaultFalse, whenDefaultTrue;
+  } cases[] = {
+      {"TRUE", 1, 1}, {"yes", 1, 1},  {" On ", 1, 1}, {"1", 1, 1},     {"false", 0, 0},
+      {"No", 0, 0},   {"off", 0, 0},  {"0", 0, 0},    {"maybe", 0, 1}, {"", 0, 1},
+      {"truex", 0, 1}, {nullptr, 0, 1},
+  };
+  for (const auto &c : cases) {
+    const char *label = c.text != nullptr ? c.text : "(null)";
+    EXPECT_EQ(Dictionary_StringToBool(c.text, FALSE), c.whenDefaultFalse) << label;
+    EXPECT_EQ(Dictionary_StringToBool(c.text, TRUE), c.whenDefaultTrue) << label;
+  }
+}
+
+TEST(MsgList, JoinsAndLogsMessages) {
+  MsgList *list = nullptr;
+  EXPECT_EQ(Take(MsgList_ToEnglishString(list)), "");
+  MsgList_Append(&list, "@&!*@*@(msg.t.one)line %u: first\n", 3u);
+  MsgList_Append(&list, "second");
+  MsgList_Append(nullptr, "dropped");
+  EXPECT_EQ(Take(MsgList_ToEnglishString(list)), "line 3: first; second");
+  tvxtest::LogCapture cap;
+  MsgList_Log(list);
+  EXPECT_EQ(cap.Lines(), (std::vector<std::string>{"line 3: first\n", "second\n"}));
+  MsgList_Free(list);
+}
+
+}  // namespace

@@ -1,0 +1,108 @@
+#include "platform/timeutil.h"
+
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+#include <string>
+
+namespace {
+
+// Sets TZ for one scope and restores the previous value.
+class ScopedTz {
+ public:
+  explicit ScopedTz(const char *value) {
+    const char *old = std::getenv("TZ");
+    had_ = old != nullptr;
+    if (had_) old_ = old;
+    if (value != nullptr) {
+      setenv("TZ", value, 1);
+    } else {
+      unsetenv("TZ");
+    }
+  }
+  ~ScopedTz() {
+    if (had_) {
+      setenv("TZ", old_.c_str(), 1);
+    } else {
+      unsetenv("TZ");
+    }
+  }
+  ScopedTz(const ScopedTz &) = delete;
+  ScopedTz &operator=(const ScopedTz &) = delete;
+
+ private:
+  bool had_ = false;
+  std::string old_;
+};
+
+struct ZoneCase {
+  const char *tz;
+  const char *windowsName;  // null: no Windows zone
+  int index;
+};
+
+const ZoneCase kZones[] = {
+    {"Europe/Berlin", "W. Europe Standard Time", 110},
+    {"America/Los_Angeles", "Pacific Standard Time", 4},
+    {"Asia/Tokyo", "Tokyo Standard Time", 235},
+    {"Europe/Moscow", "Russian Standard Time", 145},
+    {"Australia/Sydney", "AUS Eastern Standard Time", 255},
+    {"UTC", "UTC", 90},
+    // Forms of $TZ: a leading colon, a path into a zoneinfo tree, an alias.
+    {":Europe/London", "GMT Standard Time", 85},
+    {"/usr/share/zoneinfo/America/New_York", "Eastern Standard Time", 35},
+    {":/usr/share/zoneinfo/posix/Asia/Kolkata", "India Standard Time", 190},
+    {"US/Pacific", "Pacific Standard Time", 4},
+    // A Windows zone newer than the numbered list: name, but no number.
+    {"America/Argentina/Buenos_Aires", "Argentina Standard Time", -1},
+};
+
+TEST(TimeUtil, HostZoneFromTz) {
+  for (const ZoneCase &c : kZones) {
+    ScopedTz tz(c.tz);
+    char *name = nullptr;
+    int index = TimeUtil_GetLocalWindowsTimeZoneIndexAndName(&name);
+    EXPECT_EQ(index, c.index) << c.tz;
+    ASSERT_NE(name, nullptr) << c.tz;
+    EXPECT_STREQ(name, c.windowsName) << c.tz;
+    std::free(name);
+  }
+}
+
+TEST(TimeUtil, UnknownZoneIdsHaveNoWindowsZone) {
+  for (const char *id : {"Mars/Olympus_Mons", "", "Europe/Berlin/../../etc"}) {
+    char *name = reinterpret_cast<char *>(1);
+    EXPECT_EQ(TimeUtil_WindowsZoneForId(id, &name), -1) << id;
+    EXPECT_EQ(name, nullptr) << id;
+  }
+  EXPECT_EQ(TimeUtil_WindowsZoneForId(nullptr, nullptr), -1);
+}
+
+TEST(TimeUtil, NameIsOptional) {
+  ScopedTz tz("Asia/Seoul");
+  EXPECT_EQ(TimeUtil_GetLocalWindowsTimeZoneIndexAndName(nullptr), 230);
+}
+
+TEST(TimeUtil, IndexTableUsesCurrentWindowsNames) {
+  // Every tabled name must be one that the zone lookup can produce,
+  // otherwise its row is dead.
+  const std::pair<const char *, const char *> samples[] = {
+      {"Pacific/Midway", "UTC-11"},         {"Atlantic/South_Georgia", "UTC-02"},
+      {"America/Chihuahua", nullptr},       {"Asia/Kabul", "Afghanistan Standard Time"},
+      {"Pacific/Fiji", "Fiji Standard Time"}, {"Pacific/Tongatapu", "Tonga Standard Time"},
+  };
+  for (const auto &[id, expected] : samples) {
+    char *name = nullptr;
+    int index = TimeUtil_WindowsZoneForId(id, &name);
+    ASSERT_NE(name, nullptr) << id;
+    if (expected != nullptr) {
+      EXPECT_STREQ(name, expected) << id;
+    }
+    EXPECT_GE(index, 0) << id << " -> " << name;
+    std::free(name);
+  }
+  EXPECT_EQ(TimeUtil_WindowsZoneIndex("No Such Standard Time"), -1);
+  EXPECT_EQ(TimeUtil_WindowsZoneIndex(nullptr), -1);
+}
+
+}  // namespace

@@ -1,0 +1,60 @@
+#include "support/udf_walk.h"
+
+#include <vector>
+
+namespace tvxtest {
+
+namespace {
+
+void WalkDir(UDFVolume *volume, const std::string &prefix, UdfTree *tree, int depth) {
+  UDFDir *dir = UDF_OpenDir(volume, nullptr, prefix.c_str());
+  if (dir == nullptr) {
+    tree->failures++;
+    return;
+  }
+  std::vector<std::pair<std::string, bool>> entries;
+  while (const char *name = UDF_ReadDir(dir, 0)) entries.emplace_back(name, UDF_DirEntryIsDir(dir));
+  UDF_CloseDir(dir);
+  for (const auto &[name, isDir] : entries) {
+    std::string path = prefix.empty() ? name : prefix + "/" + name;
+    if (isDir) {
+      tree->dirs[path] = true;
+      if (depth < 300) WalkDir(volume, path, tree, depth + 1);
+      continue;
+    }
+    UDFFile *file = UDF_OpenFile(volume, nullptr, path.c_str());
+    if (file == nullptr) {
+      tree->failures++;
+      continue;
+    }
+    uint64_t size = UDF_GetFileSize(volume, file);
+    std::string data;
+    if (size > (64u << 20)) {
+      tree->failures++;
+    } else {
+      data.resize(size);
+      if (!UDF_PReadFile(file, data.data(), 0, data.size())) tree->failures++;
+    }
+    UDF_CloseFile(file);
+    tree->files[path] = data;
+  }
+}
+
+}  // namespace
+
+UdfTree WalkUdf(UDFVolume *volume) {
+  UdfTree tree;
+  WalkDir(volume, "", &tree, 0);
+  return tree;
+}
+
+UdfTree WalkUdfImage(const std::string &path, bool *opened) {
+  UDFVolume *volume = UDF_Open(path.c_str());
+  *opened = volume != nullptr;
+  if (volume == nullptr) return {};
+  UdfTree tree = WalkUdf(volume);
+  UDF_Close(volume);
+  return tree;
+}
+
+}  // namespace tvxtest

@@ -1,0 +1,26 @@
+// Walks a whole UDF volume through the public calls, for comparisons with
+// other readers and for hostile-image tests.
+#pragma once
+
+#include <cstdint>
+#include <map>
+#include <string>
+
+#include "tvx_udf.h"
+
+namespace tvxtest {
+
+struct UdfTree {
+  // Paths are "dir/file", without a leading "/".
+  std::map<std::string, std::string> files;  // path -> bytes
+  std::map<std::string, bool> dirs;
+  int failures = 0;  // entries that could not be opened or read
+};
+
+// WalkUdf lists every directory and reads every file below the root.
+UdfTree WalkUdf(UDFVolume *volume);
+
+// Opens the image at `path` and walks it; `opened` says whether it opened.
+UdfTree WalkUdfImage(const std::string &path, bool *opened);
+
+}  // namespace tvxtest
