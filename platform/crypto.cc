@@ -1,0 +1,109 @@
+#include "platform/crypto.h"
+
+#include <openssl/evp.h>
+#include <strings.h>
+
+#include "platform/log.h"
+
+struct CryptoHash {
+  const char *name;
+  const char *aliases[2];
+  const EVP_MD *(*md)();
+  size_t size;
+};
+
+namespace {
+
+const CryptoHash kHashes[] = {
+    {"SHA-256", {"SHA256", "SHA2-256"}, EVP_sha256, 32},
+    {"SHA-1", {"SHA1", nullptr}, EVP_sha1, 20},
+    {"SHA-512", {"SHA512", "SHA2-512"}, EVP_sha512, 64},
+};
+
+EVP_MD_CTX *State(CryptoHashSHA256Context *ctx) { return static_cast<EVP_MD_CTX *>(ctx->state); }
+
+}  // namespace
+
+const char *CryptoError_ToString(CryptoError error) {
+  switch (error) {
+    case CRYPTO_ERROR_SUCCESS: return "success";
+    case CRYPTO_ERROR_UNKNOWN_ALGORITHM: return "unknown algorithm";
+    case CRYPTO_ERROR_BAD_BUFFER_SIZE: return "bad buffer size";
+    case CRYPTO_ERROR_OPERATION_FAILED: return "operation failed";
+    case CRYPTO_ERROR_NOMEM: return "out of memory";
+  }
+  return "unknown error";
+}
+
+CryptoError CryptoHash_FromString(const char *name, const CryptoHash **out_hash) {
+  *out_hash = nullptr;
+  if (name == nullptr) return CRYPTO_ERROR_UNKNOWN_ALGORITHM;
+  for (const auto &h : kHashes) {
+    bool match = strcasecmp(h.name, name) == 0;
+    for (const char *alias : h.aliases) match = match || (alias != nullptr && strcasecmp(alias, name) == 0);
+    if (match) {
+      *out_hash = &h;
+      return CRYPTO_ERROR_SUCCESS;
+    }
+  }
+  return CRYPTO_ERROR_UNKNOWN_ALGORITHM;
+}
+
+size_t CryptoHash_GetOutputSize(const CryptoHash *hash) { return hash->size; }
+
+CryptoError CryptoHash_Compute(const CryptoHash *hash, const void *data, size_t len,
+                               uint8_t *out, size_t outSize) {
+  if (outSize != hash->size) return CRYPTO_ERROR_BAD_BUFFER_SIZE;
+  unsigned int written = 0;
+  if (EVP_Digest(data, len, out, &written, hash->md(), nullptr) != 1 || written != hash->size) {
+    return CRYPTO_ERROR_OPERATION_FAILED;
+  }
+  return CRYPTO_ERROR_SUCCESS;
+}
+
+void CryptoHash_InitSHA256(CryptoHashSHA256Context *ctx) {
+  EVP_MD_CTX *md = EVP_MD_CTX_new();
+  if (md == nullptr || EVP_DigestInit_ex(md, EVP_sha256(), nullptr) != 1) {
+    Panic("CryptoHash_InitSHA256: cannot start a SHA-256 context\n");
+  }
+  ctx->state = md;
+}
+
+void CryptoHash_UpdateSHA256(CryptoHashSHA256Context *ctx, const void *data, size_t len) {
+  if (EVP_DigestUpdate(State(ctx), data, len) != 1) {
+    Panic("CryptoHash_UpdateSHA256: digest update failed\n");
+  }
+}
+
+void CryptoHash_FinalSHA256(CryptoHashSHA256Context *ctx, uint8_t digest[32]) {
+  unsigned int written = 0;
+  if (EVP_DigestFinal_ex(State(ctx), digest, &written) != 1 || written != 32) {
+    Panic("CryptoHash_FinalSHA256: digest final failed\n");
+  }
+  CryptoHash_AbortSHA256(ctx);
+}
+
+void CryptoHash_AbortSHA256(CryptoHashSHA256Context *ctx) {
+  EVP_MD_CTX_free(State(ctx));
+  ctx->state = nullptr;
+}
+
+Bool Base64_Encode(const uint8_t *in, size_t len, char *out, size_t outSize, size_t *out_len) {
+  if (len > (SIZE_MAX - 1) / 4 * 3 - 2) return FALSE;
+  size_t need = (len + 2) / 3 * 4 + 1;
+  if (out == nullptr || outSize < need) return FALSE;
+  // EVP_EncodeBlock takes an int length; encode in whole 3-byte groups.
+  constexpr size_t kChunk = 3 * (1u << 20);
+  size_t done = 0, written = 0;
+  do {
+    size_t n = len - done < kChunk ? len - done : kChunk;
+    int w = EVP_EncodeBlock(reinterpret_cast<unsigned char *>(out + written), in + done,
+                            static_cast<int>(n));
+    if (w < 0) return FALSE;
+    written += static_cast<size_t>(w);
+    done += n;
+  } while (done < len);
+  out[written] = '\0';
+  if (out_len != nullptr) *out_len = written;
+  return TRUE;
+}

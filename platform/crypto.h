@@ -1,0 +1,48 @@
+// Hashing and base64 over OpenSSL's EVP interface.
+#pragma once
+
+#include "tvx_base.h"
+
+#include <cstddef>
+#include <cstdint>
+
+// CryptoError: 0 is success; the other values name what went wrong
+// (CryptoError_ToString gives a constant English text).
+enum CryptoError {
+  CRYPTO_ERROR_SUCCESS = 0,
+  CRYPTO_ERROR_UNKNOWN_ALGORITHM = 1,
+  CRYPTO_ERROR_BAD_BUFFER_SIZE = 2,
+  CRYPTO_ERROR_OPERATION_FAILED = 3,
+  CRYPTO_ERROR_NOMEM = 4,
+};
+const char *CryptoError_ToString(CryptoError error);
+
+// A hash algorithm: a constant of the library, never freed.
+struct CryptoHash;
+
+// CryptoHash_FromString finds an algorithm by name ("SHA-256", "SHA-1",
+// "SHA-512"; case ignored; also "SHA256"...). *out_hash is null on failure.
+CryptoError CryptoHash_FromString(const char *name, const CryptoHash **out_hash);
+// CryptoHash_GetOutputSize: digest bytes (32 for SHA-256).
+size_t CryptoHash_GetOutputSize(const CryptoHash *hash);
+// CryptoHash_Compute hashes `len` bytes into `out`, which must hold exactly
+// the output size (`outSize`), else CRYPTO_ERROR_BAD_BUFFER_SIZE.
+CryptoError CryptoHash_Compute(const CryptoHash *hash, const void *data, size_t len,
+                               uint8_t *out, size_t outSize);
+
+// Streaming SHA-256. Init starts a context, Update feeds it, Final writes the
+// 32-byte digest and ends it (Init again before reuse). A context that is
+// never finished must be ended with CryptoHash_AbortSHA256.
+struct CryptoHashSHA256Context {
+  void *state;  // owned by the functions below
+};
+void CryptoHash_InitSHA256(CryptoHashSHA256Context *ctx);
+void CryptoHash_UpdateSHA256(CryptoHashSHA256Context *ctx, const void *data, size_t len);
+void CryptoHash_FinalSHA256(CryptoHashSHA256Context *ctx, uint8_t digest[32]);
+void CryptoHash_AbortSHA256(CryptoHashSHA256Context *ctx);
+
+// Base64_Encode writes the standard base64 form (with "=" padding) of `len`
+// bytes and a terminating NUL into `out` of `outSize` bytes; FALSE when it
+// does not fit ((len + 2) / 3 * 4 + 1 bytes are needed). `out_len`
+// (optional) receives the text length.
+Bool Base64_Encode(const uint8_t *in, size_t len, char *out, size_t outSize, size_t *out_len);

@@ -1,0 +1,83 @@
+#include "platform/crypto.h"
+#include "platform/vthread.h"
+
+#include <gtest/gtest.h>
+
+#include <string>
+#include <thread>
+
+namespace {
+
+std::string Hex(const uint8_t *p, size_t n) {
+  static const char kHex[] = "0123456789abcdef";
+  std::string s;
+  for (size_t i = 0; i < n; i++) {
+    s += kHex[p[i] >> 4];
+    s += kHex[p[i] & 15];
+  }
+  return s;
+}
+
+const char kAbcSha256[] = "ba7816bf8f01cfea414140de5dae2223b00361a396177a9cb410ff61f20015ad";
+
+TEST(CryptoHash, KnownDigestsAndNames) {
+  const CryptoHash *h = nullptr;
+  ASSERT_EQ(CryptoHash_FromString("sha-256", &h), CRYPTO_ERROR_SUCCESS);
+  ASSERT_EQ(CryptoHash_GetOutputSize(h), 32u);
+  uint8_t out[32];
+  ASSERT_EQ(CryptoHash_Compute(h, "abc", 3, out, sizeof out), CRYPTO_ERROR_SUCCESS);
+  EXPECT_EQ(Hex(out, 32), kAbcSha256);
+  EXPECT_EQ(CryptoHash_Compute(h, "abc", 3, out, 31), CRYPTO_ERROR_BAD_BUFFER_SIZE);
+
+  EXPECT_EQ(CryptoHash_FromString("MD5", &h), CRYPTO_ERROR_UNKNOWN_ALGORITHM);
+  EXPECT_EQ(h, nullptr);
+  EXPECT_STREQ(CryptoError_ToString(CRYPTO_ERROR_UNKNOWN_ALGORITHM), "unknown algorithm");
+}
+
+TEST(CryptoHash, StreamingMatchesOneShotAtEverySplit) {
+  std::string text = "The quick brown fox jumps over the lazy dog, again and again.";
+  const CryptoHash *h = nullptr;
+  ASSERT_EQ(CryptoHash_FromString("SHA-256", &h), CRYPTO_ERROR_SUCCESS);
+  uint8_t want[32];
+  ASSERT_EQ(CryptoHash_Compute(h, text.data(), text.size(), want, 32), CRYPTO_ERROR_SUCCESS);
+  for (size_t split = 0; split <= text.size(); split++) {
+    CryptoHashSHA256Context ctx;
+    CryptoHash_InitSHA256(&ctx);
+    CryptoHash_UpdateSHA256(&ctx, text.data(), split);
+    CryptoHash_UpdateSHA256(&ctx, text.data() + split, text.size() - split);
+    uint8_t got[32];
+    CryptoHash_FinalSHA256(&ctx, got);
+    EXPECT_EQ(Hex(got, 32), Hex(want, 32)) << split;
+  }
+}
+
+TEST(Base64, Rfc4648VectorsAndExactBufferSizes) {
+  struct Case {
+    const char *in, *want;
+  } cases[] = {{"", ""},         {"f", "Zg=="},         {"fo", "Zm8="},          {"foo", "Zm9v"},
+               {"foob", "Zm9vYg=="}, {"fooba", "Zm9vYmE="}, {"foobar", "Zm9vYmFy"}};
+  for (const auto &c : cases) {
+    size_t len = std::char_traits<char>::length(c.in);
+    size_t need = (len + 2) / 3 * 4 + 1;
+    std::string out(need, 'x');
+    size_t written = 99;
+    ASSERT_TRUE(Base64_Encode(reinterpret_cast<const uint8_t *>(c.in), len, out.data(), need,
+                              &written))
+        << c.in;
+    EXPECT_STREQ(out.c_str(), c.want);
+    EXPECT_EQ(written, need - 1);
+    EXPECT_FALSE(Base64_Encode(reinterpret_cast<const uint8_t *>(c.in), len, out.data(),
+                               need - 1, nullptr))
+        << c.in;
+  }
+}
+
+TEST(VThreadBase, KernelIdsDifferBetweenThreads) {
+  unsigned long mine = VThreadBase_GetKernelID(), other = 0;
+  std::thread([&other] { other = VThreadBase_GetKernelID(); }).join();
+  EXPECT_NE(mine, 0u);
+  EXPECT_NE(mine, other);
+  EXPECT_EQ(mine, VThreadBase_GetKernelID());
+}
+
+}  // namespace
