@@ -17,6 +17,17 @@
  * of name formats the caller accepts; the reader uses the most preferred one
  * present on the image (Rock Ridge, then Joliet, then plain) and falls back to
  * plain names when none of the accepted ones is present. 0 accepts all.
+ * Bits other than these three make an open call fail with
+ * ISO9660_ERR_ARGUMENT.
+ *
+ * Limits. The reader refuses (ISO9660_ERR_CORRUPT) directories larger than
+ * 16 MiB, directory paths through a directory loop, extents beyond the end of
+ * the image and records whose lengths or both-endian copies disagree.
+ * Extraction refuses trees nested deeper than 128 levels.
+ *
+ * Handles. Directory and file handles belong to the image that opened them;
+ * passing one to another image fails with ISO9660_ERR_ARGUMENT. Calls on one
+ * image are not synchronised: use an image from one thread at a time.
  */
 #ifndef TVX_ISO9660_H
 #define TVX_ISO9660_H
@@ -48,7 +59,9 @@ typedef enum Iso9660Result {
 
 /* Iso9660DirEntry, the record Iso9660_ReadDir fills. `name` comes first. */
 typedef struct Iso9660DirEntry {
-  char name[256];      /* UTF-8, NUL-terminated */
+  char name[256];      /* UTF-8, NUL-terminated; a longer name is cut at a
+                          character boundary (open such an entry through this
+                          record, not by its name) */
   uint32_t size;       /* file size; all ones when it does not fit 32 bits */
   Bool isDirectory;
   uint64_t size64;     /* file size, exact */
@@ -64,20 +77,27 @@ typedef Bool (*Iso9660CloseCB)(void *handle);
 /* Iso9660_ListFormats stores in *inout_formats the name formats present on
  * the image at `path` (bit mask). Returns 0, or a failure code. */
 TVX_EXPORT int Iso9660_ListFormats(const char *path, uint32_t *inout_formats);
-/* Iso9660_Open opens the image at `path` with open mode `mode`. */
+/* Iso9660_Open opens the image at `path` with open mode `mode`: 0, or
+ * ISO9660_ERR_IO (cannot open the file), ISO9660_ERR_FORMAT (no ISO 9660
+ * volume), ISO9660_ERR_CORRUPT. *out_image is NULL on failure. */
 TVX_EXPORT int Iso9660_Open(const char *path, uint32_t mode, Iso9660Image **out_image);
-/* Iso9660_OpenWithReader opens an image read through the caller's callbacks.
- * The image takes ownership of `handle`: closeCB is called exactly once, by
- * Iso9660_Close, or before a failing Iso9660_OpenWithReader returns. */
+/* Iso9660_OpenWithReader opens an image read through the caller's callbacks
+ * (readCB required, closeCB optional). On success the image owns `handle`:
+ * Iso9660_Close calls closeCB once. On failure closeCB is not called and the
+ * handle stays the caller's to close. */
 TVX_EXPORT int Iso9660_OpenWithReader(Iso9660ReadCB readCB, Iso9660CloseCB closeCB,
                                       void *handle, uint32_t mode,
                                       Iso9660Image **out_image);
-/* Iso9660_Close releases the image and everything opened on it. */
+/* Iso9660_Close releases the image and every directory and file handle still
+ * open on it. */
 TVX_EXPORT int Iso9660_Close(Iso9660Image *image);
 /* Iso9660_GetVolumeId returns the primary volume identifier without trailing
  * blanks (allocated), or NULL. */
 TVX_EXPORT char *Iso9660_GetVolumeId(Iso9660Image *image);
 
+/* Iso9660_OpenDir opens the directory at `path` (NULL, "" or "/": the root);
+ * ISO9660_ERR_NOT_FOUND, ISO9660_ERR_NOT_DIR or ISO9660_ERR_CORRUPT
+ * otherwise. The listing is read whole when the directory opens. */
 TVX_EXPORT int Iso9660_OpenDir(Iso9660Image *image, const char *path, Iso9660Dir **out_dir);
 /* Iso9660_ReadDir fills `entry` with the next entry ("." and ".." are never
  * returned): 0, or 5 at the end. */
@@ -86,24 +106,37 @@ TVX_EXPORT int Iso9660_RewindDir(Iso9660Image *image, Iso9660Dir *dir);
 TVX_EXPORT int Iso9660_CloseDir(Iso9660Image *image, Iso9660Dir *dir);
 
 /* Iso9660_OpenFile opens the file an entry of Iso9660_ReadDir names (a
- * directory entry fails with ISO9660_ERR_IS_DIR). */
+ * directory entry fails with ISO9660_ERR_IS_DIR). The record must come from
+ * Iso9660_ReadDir on the same image, unchanged (ISO9660_ERR_ARGUMENT
+ * otherwise), or be a zero-filled record holding only a name: that name is
+ * then resolved as a path from the root, like Iso9660_OpenDir paths. A file
+ * handle stays valid after its directory handle is closed. */
 TVX_EXPORT int Iso9660_OpenFile(Iso9660Image *image, const Iso9660DirEntry *entry,
                                 Iso9660File **out_file);
 /* Iso9660_ReadFile reads the next bytes of the file: *inout_length is the room
- * in `buffer` on entry and the count read on return. 0 when bytes were read,
- * 5 at the end of the file (nothing read), else a failure. */
+ * in `buffer` on entry and the count read on return (at most the room; fewer
+ * only at the end of the file). 0 when bytes were read, 5 at the end of the
+ * file (nothing read), else a failure (count 0): ISO9660_ERR_IO when the
+ * image cannot be read, ISO9660_ERR_ARGUMENT for a room of 0 before the end. */
 TVX_EXPORT int Iso9660_ReadFile(Iso9660Image *image, Iso9660File *file, void *buffer,
                                 size_t *inout_length);
 TVX_EXPORT int Iso9660_CloseFile(Iso9660Image *image, Iso9660File *file);
 
-/* Iso9660_Extract copies the file or the whole directory tree at
- * `pathInImage` into the host directory `destDir` (created when missing) under
- * its own name; "" or "/" extracts the root's contents. Entry names that would
- * leave `destDir` ("..", "/" inside a name) fail with ISO9660_ERR_UNSAFE. */
+/* Iso9660_Extract copies into the host directory `destDir` (created with its
+ * parents when missing) the file at `pathInImage` under its own name in the
+ * image, or, when `pathInImage` names a directory, that directory's contents
+ * with all subdirectories ("", "/" or NULL: the root's contents). Existing
+ * files are replaced. The whole tree is checked before anything is written:
+ * an entry name that would leave `destDir` ("", ".", "..", "/" inside a name)
+ * fails with ISO9660_ERR_UNSAFE, a directory loop or bad extent with
+ * ISO9660_ERR_CORRUPT, and nothing is written then. Symbolic links recorded
+ * in the image are skipped; an existing symbolic link below `destDir` where an
+ * entry goes fails with ISO9660_ERR_UNSAFE and is never followed. A failure
+ * while writing leaves what was written so far. */
 TVX_EXPORT int Iso9660_Extract(Iso9660Image *image, const char *pathInImage,
                                const char *destDir);
 /* Iso9660_ExtractFileEx copies the file at `pathInImage` to the host path
- * `targetPath` (created or replaced). */
+ * `targetPath` (created or replaced; removed again when the copy fails). */
 TVX_EXPORT int Iso9660_ExtractFileEx(Iso9660Image *image, const char *pathInImage,
                                      const char *targetPath);
 

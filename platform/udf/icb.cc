@@ -97,6 +97,9 @@ Status Volume::LoadNode(LbAddr icb, Node *out) {
   std::vector<LbAddr> chain;
   Status st = ParseAllocation(&node, ads, static_cast<size_t>(adLen), adType, &covered, &chain);
   if (st != Status::kOk) return st;
+  // Descriptors must account for every byte of the recorded size (sparse
+  // parts included); a size beyond them would promise data that is nowhere.
+  if (covered < node.size) return Status::kCorrupt;
   *out = std::move(node);
   return Status::kOk;
 }
@@ -160,8 +163,6 @@ Status Volume::ReadNode(const Node &node, uint64_t offset, void *buf, size_t len
   if (len != 0 && it == node.extents.begin()) return Status::kCorrupt;
   if (it != node.extents.begin()) --it;
   while (len > 0) {
-    // Extents that stop short of the recorded size leave a tail that no
-    // descriptor covers; it cannot be read.
     if (it == node.extents.end() || offset - it->fileOffset >= it->length) {
       return Status::kCorrupt;
     }

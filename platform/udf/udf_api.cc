@@ -152,10 +152,13 @@ TVX_EXPORT UDFFile *UDF_OpenFile(UDFVolume *volume, UDFDir *dir, const char *nam
   try {
     auto file = std::make_unique<UDFFile>();
     file->volume = volume;
-    const DirEntry *e = dir != nullptr ? FindEntry(dir, name) : nullptr;
-    if (e != nullptr) {
-      // A plain name in an open directory: its listing is already in memory.
-      if (volume->vol->LoadNode(e->icb, &file->node) != Status::kOk) return nullptr;
+    if (dir != nullptr && std::strchr(name, '/') == nullptr) {
+      // A plain name in an open directory: its listing is already in memory,
+      // which keeps probing many names cheap.
+      const DirEntry *e = FindEntry(dir, name);
+      if (e == nullptr || volume->vol->LoadNode(e->icb, &file->node) != Status::kOk) {
+        return nullptr;
+      }
     } else {
       std::vector<LbAddr> chain = ChainFor(volume, dir);
       if (tvx::udf::Lookup(volume->vol.get(), &chain, name, &file->node) != Status::kOk) {

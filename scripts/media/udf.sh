@@ -6,6 +6,8 @@
 #   empty-<rev>.img   empty volumes from mkudffs, one per UDF revision
 #                     (2.50 and 2.60 only exist for write-once media: they
 #                     carry a virtual allocation table)
+#   empty-sparable.img  a rewritable-media volume with a sparable partition
+#   empty-vat150.img  a write-once volume with a UDF 1.50 allocation table
 # The tree gets one generated file at mastering time: sources/big.bin, 300 KiB
 # of a fixed pattern, so reads cross many blocks without a binary in git.
 # Images with a metadata partition holding files come from the test-side
@@ -68,3 +70,8 @@ for rev in 1.02 1.50 2.00 2.01 2.50 2.60; do
   mkudffs --new-file --media-type=$media --udfrev=$rev --label="EMPTY${rev/./}" "$img" 4096 \
     >/dev/null
 done
+rm -f "$out/empty-sparable.img" "$out/empty-vat150.img"
+mkudffs --new-file --media-type=cdrw --udfrev=2.01 --label=EMPTYSPAR "$out/empty-sparable.img" 3000 \
+  >/dev/null
+mkudffs --new-file --media-type=cdr --udfrev=1.50 --label=EMPTYVAT15 "$out/empty-vat150.img" 1000 \
+  >/dev/null

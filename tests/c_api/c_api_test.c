@@ -94,8 +94,38 @@ static void TestAutoInstall(void) {
   free(pretty);
 }
 
+static void TestIso9660(void) {
+  phase = "iso9660";
+  Iso9660Image *image = (Iso9660Image *)&image; /* must be cleared */
+  uint32_t formats = 0;
+  CHECK(Iso9660_Open("/nonexistent/tvx-missing.iso", 0, &image) == ISO9660_ERR_IO);
+  CHECK(image == NULL);
+  CHECK(Iso9660_ListFormats("/nonexistent/tvx-missing.iso", &formats) == ISO9660_ERR_IO);
+  CHECK(Iso9660_GetVolumeId(NULL) == NULL);
+  CHECK(sizeof(((Iso9660DirEntry *)0)->name) == 256);
+}
+
+static void TestGuess(void) {
+  phase = "guess";
+  GuessResult r;
+  memset(&r, 0x5A, sizeof r);
+  CHECK(Guess_Guest("/nonexistent/image.iso", NULL, &r) == 2);
+  CHECK(r.guestOS == NULL && r.language[0] == '\0');
+  CHECK(Guess_IsEqual(&r, &r));
+  CHECK(strcmp(Guess_GetSubString(GUESS_VERSION_UNKNOWN), SUB_NAMES[0]) == 0);
+  r.guestOS = "winXPPro";
+  char *text = Guess_GetVersionString("Windows XP Professional", &r);
+  CHECK(text != NULL && strcmp(text, "Windows XP Professional") == 0);
+  free(text);
+  unsigned char elf[20] = {0};
+  elf[18] = 62;
+  CHECK(Guess_ELF_Arch(elf, sizeof elf) == GUESS_ELF_ARCH_X86_64);
+}
+
 int main(void) {
   TestBase();
+  TestGuess();
+  TestIso9660();
   TestUdf();
   TestIni();
   TestAutoInstall();

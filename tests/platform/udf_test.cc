@@ -60,6 +60,7 @@ TEST(UdfMedia, EmptyVolumeOfEachRevision) {
       {"empty-102.img", "EMPTY102"}, {"empty-150.img", "EMPTY150"},
       {"empty-200.img", "EMPTY200"}, {"empty-201.img", "EMPTY201"},
       {"empty-250.img", "EMPTY250"}, {"empty-260.img", "EMPTY260"},
+      {"empty-sparable.img", "EMPTYSPAR"}, {"empty-vat150.img", "EMPTYVAT15"},
   };
   for (const auto &c : cases) {
     SCOPED_TRACE(c.file);

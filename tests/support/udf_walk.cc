@@ -29,14 +29,17 @@ void WalkDir(UDFVolume *volume, const std::string &prefix, UdfTree *tree, int de
     }
     uint64_t size = UDF_GetFileSize(volume, file);
     std::string data;
-    if (size > (64u << 20)) {
-      tree->failures++;
-    } else {
+    bool ok = size <= (64u << 20);
+    if (ok) {
       data.resize(size);
-      if (!UDF_PReadFile(file, data.data(), 0, data.size())) tree->failures++;
+      ok = UDF_PReadFile(file, data.data(), 0, data.size());
     }
     UDF_CloseFile(file);
-    tree->files[path] = data;
+    if (ok) {
+      tree->files[path] = data;
+    } else {
+      tree->failures++;
+    }
   }
 }
 

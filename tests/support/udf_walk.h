@@ -12,7 +12,7 @@ namespace tvxtest {
 
 struct UdfTree {
   // Paths are "dir/file", without a leading "/".
-  std::map<std::string, std::string> files;  // path -> bytes
+  std::map<std::string, std::string> files;  // path -> bytes, of files read whole
   std::map<std::string, bool> dirs;
   int failures = 0;  // entries that could not be opened or read
 };

@@ -1,0 +1,240 @@
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+#include <set>
+#include <string>
+
+#include "lib/guessGuest/guess_internal.h"
+#include "support/log_capture.h"
+
+namespace {
+
+using tvx::guess::Text;
+
+// Opens one of the guess-medium images (rr, plain, udf) for a test.
+class Medium {
+ public:
+  explicit Medium(const std::string &image) {
+    std::string path = tvxtest::MediaDir() + "/guess-medium/" + image + ".iso";
+    opened_ = tvx::guess::OpenMedium(path.c_str(), &medium_);
+  }
+  ~Medium() { tvx::guess::CloseMedium(&medium_); }
+  bool opened() const { return opened_; }
+  GuessMedium *get() { return &medium_; }
+
+ private:
+  GuessMedium medium_{};
+  bool opened_ = false;
+};
+
+std::string SeqText(int n) {
+  std::string s;
+  for (int i = 1; i <= n; ++i) s += std::to_string(i) + "\n";
+  return s;
+}
+
+TEST(GuessMedium, OpensBridgeImagesAsUdfAndOthersAsIso) {
+  struct Case {
+    const char *image;
+    uint32_t kind;
+  };
+  for (const Case &c : {Case{"rr", GUESS_MEDIUM_ISO9660}, Case{"plain", GUESS_MEDIUM_ISO9660},
+                        Case{"udf", GUESS_MEDIUM_UDF}}) {
+    Medium m(c.image);
+    ASSERT_TRUE(m.opened()) << c.image;
+    EXPECT_EQ(m.get()->kind, c.kind) << c.image;
+  }
+}
+
+// The directory path is tried as given, upper-cased, lower-cased; the
+// variant that opened is the one kept in the GuessDir.
+TEST(GuessMedium, OpenDirTriesCaseVariants) {
+  struct Case {
+    const char *image;
+    const char *asked;
+    const char *opened;  // null: must not open
+  };
+  const Case cases[] = {
+      {"udf", "i386", "I386"},       {"udf", "I386", "I386"},
+      {"udf", "LOWER", "lower"},     {"udf", "Mixed", "Mixed"},
+      {"udf", "mixed", nullptr},     {"udf", "MIXED", nullptr},
+      {"udf", "nowhere", nullptr},   {"rr", "i386", "i386"},
+      {"rr", "LOWER", "LOWER"},      {"plain", "isolinux", "isolinux"},
+      {"udf", "", ""},               {"rr", "/", "/"},
+  };
+  for (const Case &c : cases) {
+    Medium m(c.image);
+    ASSERT_TRUE(m.opened());
+    GuessDir *dir = Guess_OpenDir(m.get(), c.asked);
+    if (c.opened == nullptr) {
+      EXPECT_EQ(dir, nullptr) << c.image << ": " << c.asked;
+      continue;
+    }
+    ASSERT_NE(dir, nullptr) << c.image << ": " << c.asked;
+    EXPECT_STREQ(dir->path, c.opened) << c.image << ": " << c.asked;
+    EXPECT_TRUE(Guess_CloseDir(m.get(), dir));
+  }
+}
+
+TEST(GuessMedium, ReadFileNameReturnsWholeFileWithTerminator) {
+  struct Case {
+    const char *image;
+    const char *path;
+    std::string content;
+  };
+  const std::string big = SeqText(3000);
+  const Case cases[] = {
+      {"rr", "README", "read me first\n"},
+      {"udf", "README", "read me first\n"},
+      {"rr", "BIG.TXT", big},
+      {"plain", "BIG.TXT", big},
+      {"udf", "BIG.TXT", big},
+      {"rr", "EMPTY.TXT", ""},
+      {"plain", "empty.txt", ""},
+      {"udf", "EMPTY.TXT", ""},
+      {"udf", "i386/txtsetup.sif", "[Strings]\nwks_id = \"Sample\"\n"},
+      {"plain", "i386/txtsetup.sif", "[Strings]\nwks_id = \"Sample\"\n"},
+      {"udf", "LOWER/NOTES.TXT", "stored in a lower-case directory\n"},
+      {"rr", "/Mixed/Data.txt", "stored in a mixed-case directory\n"},
+  };
+  for (const Case &c : cases) {
+    Medium m(c.image);
+    ASSERT_TRUE(m.opened());
+    uint64_t size = 12345;
+    Text data(Guess_ReadFileName(m.get(), c.path, &size));
+    ASSERT_NE(data, nullptr) << c.image << ": " << c.path;
+    EXPECT_EQ(size, c.content.size()) << c.image << ": " << c.path;
+    EXPECT_EQ(std::string(data.get(), size), c.content) << c.image << ": " << c.path;
+    EXPECT_EQ(data.get()[size], '\0');
+  }
+}
+
+TEST(GuessMedium, ReadFileFailsOnMissingNamesAndDirectories) {
+  struct Case {
+    const char *image;
+    const char *path;
+  };
+  const Case cases[] = {
+      {"rr", "NOTHERE.TXT"}, {"udf", "NOTHERE.TXT"}, {"rr", "I386"},  // a directory
+      {"udf", "I386"},       {"rr", "nodir/file"},   {"rr", "I386/"},  // empty name
+      {"udf", ""},
+  };
+  for (const Case &c : cases) {
+    Medium m(c.image);
+    ASSERT_TRUE(m.opened());
+    EXPECT_EQ(Text(Guess_ReadFileName(m.get(), c.path, nullptr)), nullptr)
+        << c.image << ": " << c.path;
+  }
+}
+
+// FileExists tries the directory's case variants but the name only as given:
+// ISO 9660 compares names without case anyway, UDF exactly.
+TEST(GuessMedium, FileExistsMatchesNameCaseAsTheFormatDoes) {
+  struct Case {
+    const char *image;
+    const char *dir;
+    const char *name;
+    bool exists;
+  };
+  const Case cases[] = {
+      {"rr", "isolinux", "ISOLINUX.CFG", true},  {"plain", "ISOLINUX", "isolinux.cfg", true},
+      {"plain", "isolinux", "isolinux.cfg", true}, {"udf", "isolinux", "isolinux.cfg", true},
+      {"udf", "ISOLINUX", "isolinux.cfg", true}, {"udf", "isolinux", "ISOLINUX.CFG", false},
+      {"rr", "", "README", true},                {"rr", "", "isolinux", false},  // a directory
+      {"rr", "", "", false},                     {"rr", "nodir", "README", false},
+  };
+  for (const Case &c : cases) {
+    Medium m(c.image);
+    ASSERT_TRUE(m.opened());
+    EXPECT_EQ(Guess_FileExists(m.get(), c.dir, c.name), c.exists ? TRUE : FALSE)
+        << c.image << ": " << c.dir << "/" << c.name;
+  }
+}
+
+TEST(GuessMedium, FileExistsWithPrefixIgnoresCase) {
+  struct Case {
+    const char *dir;
+    const char *prefix;
+    bool exists;
+  };
+  const Case cases[] = {
+      {"sources", "install_Windows 7", true},
+      {"SOURCES", "INSTALL_WINDOWS 7 ultimate", true},
+      {"sources", "install.esd", false},
+      {"nodir", "install", false},
+      {"", "read", true},
+  };
+  for (const char *image : {"rr", "udf"}) {
+    Medium m(image);
+    ASSERT_TRUE(m.opened());
+    for (const Case &c : cases) {
+      EXPECT_EQ(Guess_FileExistsWithPrefix(m.get(), c.dir, c.prefix), c.exists ? TRUE : FALSE)
+          << image << ": " << c.dir << " " << c.prefix;
+    }
+  }
+}
+
+// Reading a listed entry through the same directory must not disturb the
+// listing: lookups scan a directory of their own.
+TEST(GuessMedium, ListingSurvivesLookupsAndRewinds) {
+  const std::set<std::string> expected = {"BIG.TXT", "EMPTY.TXT", "I386",    "isolinux",
+                                          "lower",   "Mixed",     "README",  "sources"};
+  for (const char *image : {"rr", "udf"}) {
+    Medium m(image);
+    ASSERT_TRUE(m.opened());
+    GuessDir *dir = Guess_OpenDir(m.get(), "");
+    ASSERT_NE(dir, nullptr);
+    for (int pass = 0; pass < 2; ++pass) {
+      std::set<std::string> seen;
+      while (const char *name = Guess_ReadDir(m.get(), dir)) {
+        seen.insert(name);
+        if (std::string(name) == "README") {
+          Text data(Guess_ReadFile(m.get(), dir, name, nullptr));
+          EXPECT_NE(data, nullptr) << image;
+        }
+      }
+      EXPECT_EQ(seen, expected) << image << " pass " << pass;
+      EXPECT_EQ(Guess_ReadDir(m.get(), dir), nullptr);
+      EXPECT_TRUE(Guess_RewindDir(m.get(), dir));
+    }
+    EXPECT_TRUE(Guess_CloseDir(m.get(), dir));
+  }
+}
+
+TEST(GuessMedium, CloseDirRefusesNull) {
+  Medium m("rr");
+  ASSERT_TRUE(m.opened());
+  EXPECT_FALSE(Guess_CloseDir(m.get(), nullptr));
+  GuessDir *dir = Guess_OpenDir(m.get(), "I386");
+  ASSERT_NE(dir, nullptr);
+  EXPECT_FALSE(Guess_CloseDir(nullptr, dir));
+  EXPECT_TRUE(Guess_CloseDir(m.get(), dir));
+}
+
+TEST(GuessMediumDeathTest, MediumWithoutKindStops) {
+  GuessMedium none{};
+  EXPECT_DEATH(Guess_OpenDir(&none, "I386"), "NOT_REACHED lib/guessGuest/guess:[0-9]+");
+}
+
+TEST(GuessElfArch, ClassifiesByMachineLowByte) {
+  struct Case {
+    size_t length;
+    unsigned char machine;
+    GuessElfArch arch;
+  };
+  const Case cases[] = {
+      {64, 62, GUESS_ELF_ARCH_X86_64}, {64, 3, GUESS_ELF_ARCH_X86},
+      {64, 6, GUESS_ELF_ARCH_X86},     {64, 7, GUESS_ELF_ARCH_X86},
+      {19, 0xB7, GUESS_ELF_ARCH_ARM64}, {18, 62, GUESS_ELF_ARCH_UNKNOWN},  // too short
+      {64, 40, GUESS_ELF_ARCH_UNKNOWN},  // 32-bit Arm
+      {64, 0, GUESS_ELF_ARCH_UNKNOWN},
+  };
+  for (const Case &c : cases) {
+    unsigned char header[64] = {0x7F, 'E', 'L', 'F'};
+    header[18] = c.machine;
+    EXPECT_EQ(Guess_ELF_Arch(header, c.length), c.arch)
+        << "machine " << int{c.machine} << " length " << c.length;
+  }
+}
+
+}  // namespace

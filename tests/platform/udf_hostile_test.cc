@@ -1,0 +1,379 @@
+// The UDF reader on images built in memory: every layout it must read, and
+// hostile images that must fail cleanly (never a crash, hang, leak or wrong
+// bytes). Images go through UDF_OpenWithReader, as a caller's callbacks would
+// deliver them.
+#include <gtest/gtest.h>
+
+#include <cstring>
+#include <functional>
+
+#include "support/log_capture.h"
+#include "support/udf_builder.h"
+#include "support/udf_walk.h"
+#include "tvx_udf.h"
+
+using tvxtest::UdfBuildOptions;
+using tvxtest::UdfLayout;
+using tvxtest::UdfNodeSpec;
+
+namespace {
+
+struct MemImage {
+  std::vector<uint8_t> bytes;
+  int *closes;
+};
+
+Bool ReadMem(void *h, void *buf, size_t len, uint64_t off) {
+  auto *m = static_cast<MemImage *>(h);
+  if (off > m->bytes.size() || len > m->bytes.size() - off) return FALSE;
+  std::memcpy(buf, m->bytes.data() + off, len);
+  return TRUE;
+}
+
+Bool CloseMem(void *h) {
+  auto *m = static_cast<MemImage *>(h);
+  (*m->closes)++;
+  delete m;
+  return TRUE;
+}
+
+UDFVolume *OpenBytes(const std::vector<uint8_t> &img, int *closes) {
+  return UDF_OpenWithReader(ReadMem, CloseMem, new MemImage{img, closes});
+}
+
+void Expected(const UdfNodeSpec &n, const std::string &path, tvxtest::UdfTree *t) {
+  for (const UdfNodeSpec &c : n.children) {
+    std::string p = path.empty() ? c.name : path + "/" + c.name;
+    if (c.dir) {
+      t->dirs[p] = true;
+      Expected(c, p, t);
+    } else {
+      t->files[p] = c.data;
+    }
+  }
+}
+
+tvxtest::UdfTree Expected(const UdfNodeSpec &root) {
+  tvxtest::UdfTree t;
+  Expected(root, "", &t);
+  return t;
+}
+
+// Walks `img` (when it opens) and checks that whatever was read is right:
+// damage may hide entries or fail reads, never change bytes.
+int WalkNeverLies(const std::vector<uint8_t> &img, const tvxtest::UdfTree &want, bool *opened) {
+  int failures = -1;
+  int closes = 0;
+  UDFVolume *vol = OpenBytes(img, &closes);
+  *opened = vol != nullptr;
+  if (vol != nullptr) {
+    tvxtest::UdfTree got = tvxtest::WalkUdf(vol);
+    failures = got.failures + static_cast<int>(want.files.size() - got.files.size());
+    for (const auto &[path, bytes] : got.files) {
+      auto it = want.files.find(path);
+      EXPECT_NE(it, want.files.end()) << "invented " << path;
+      if (it == want.files.end()) continue;
+      if (bytes.size() == it->second.size()) {
+        EXPECT_TRUE(bytes == it->second) << path << " read wrong bytes";
+      }
+    }
+    UDF_Close(vol);
+  }
+  EXPECT_EQ(closes, 1);
+  return failures;
+}
+
+bool IsDescriptor(const uint8_t *tag) {
+  uint8_t sum = 0;
+  for (int i = 0; i < 16; i++) {
+    if (i != 4) sum = static_cast<uint8_t>(sum + tag[i]);
+  }
+  unsigned id = tag[0] | (tag[1] << 8);
+  return sum == tag[4] && ((id >= 1 && id <= 9) || (id >= 256 && id <= 266));
+}
+
+size_t At(const UdfLayout &l, uint32_t sector, size_t off = 0) {
+  return size_t{sector} * l.blockSize + off;
+}
+
+}  // namespace
+
+TEST(UdfBuilt, ReadsEveryLayout) {
+  const UdfNodeSpec tree = tvxtest::SampleUdfTree(50000);
+  const tvxtest::UdfTree want = Expected(tree);
+  struct Case {
+    const char *name;
+    UdfBuildOptions opt;
+  };
+  std::vector<Case> cases(9);
+  cases[0].name = "1.02 short_ad";
+  cases[1].name = "long_ad";
+  cases[1].opt.longAds = true;
+  cases[2].name = "extended entries";
+  cases[2].opt.extendedEntries = true;
+  cases[3].name = "2.50 metadata partition";
+  cases[3].opt.metadataPartition = true;
+  cases[4].name = "embedded data";
+  cases[4].opt.embedSmallFiles = true;
+  cases[4].opt.metadataPartition = true;
+  cases[5].name = "scattered extents";
+  cases[5].opt.extentBlocks = 3;
+  cases[5].opt.scatterExtents = true;
+  cases[6].name = "allocation extent chains";
+  cases[6].opt.extentBlocks = 1;
+  cases[6].opt.scatterExtents = true;
+  cases[6].opt.adsPerEntry = 4;
+  cases[6].opt.metadataPartition = true;
+  cases[7].name = "512-byte blocks";
+  cases[7].opt.blockSize = 512;
+  cases[7].opt.extentBlocks = 7;
+  cases[8].name = "4096-byte blocks";
+  cases[8].opt.blockSize = 4096;
+  cases[8].opt.longAds = true;
+  for (const Case &c : cases) {
+    SCOPED_TRACE(c.name);
+    UdfLayout layout;
+    std::vector<uint8_t> img = tvxtest::BuildUdf(tree, c.opt, &layout);
+    int closes = 0;
+    UDFVolume *vol = OpenBytes(img, &closes);
+    ASSERT_NE(vol, nullptr);
+    char *id = UDF_GetVolumeId(vol);
+    EXPECT_STREQ(id, "TVXBUILT");
+    free(id);
+    tvxtest::UdfTree got = tvxtest::WalkUdf(vol);
+    EXPECT_EQ(got.failures, 0);
+    EXPECT_EQ(got.dirs, want.dirs);
+    EXPECT_TRUE(got.files == want.files);
+    UDF_Close(vol);
+    EXPECT_EQ(closes, 1);
+  }
+}
+
+TEST(UdfHostile, MalformedStructuresFailCleanly) {
+  struct Case {
+    const char *name;
+    std::function<void(UdfBuildOptions *)> options;
+    std::function<void(std::vector<uint8_t> *, const UdfLayout &)> damage;
+    int opens;        // 0: fails to open; 1: opens, some entries fail; 2: reads whole
+    const char *log;  // a line the reader must log, or ""
+  };
+  auto flipChecksum = [](std::vector<uint8_t> *img, size_t off) { (*img)[off + 4] ^= 0x55; };
+  const Case cases[] = {
+      {"both anchors broken", nullptr,
+       [&](auto *img, const UdfLayout &l) {
+         flipChecksum(img, At(l, 256));
+         flipChecksum(img, img->size() - l.blockSize);
+       },
+       0, ""},
+      {"main sequence broken, reserve used", nullptr,
+       [&](auto *img, const UdfLayout &l) { flipChecksum(img, At(l, l.lvdSector)); }, 2, ""},
+      {"both sequences broken", nullptr,
+       [&](auto *img, const UdfLayout &l) {
+         flipChecksum(img, At(l, l.lvdSector));
+         flipChecksum(img, At(l, l.lvdSector + 16));
+       },
+       0, "UDF: no usable volume descriptor sequence (corrupt structure)\n"},
+      {"logical block size lies", nullptr,
+       [&](auto *img, const UdfLayout &l) {
+         for (uint32_t s : {l.lvdSector, l.lvdSector + 16}) {
+           tvxtest::PutLe32(img, At(l, s, 212), 4096);
+           tvxtest::SealTag(img, At(l, s));
+         }
+       },
+       0, "UDF: logical block size 4096 differs from the sector size 2048\n"},
+      {"partition starts past the end", nullptr,
+       [&](auto *img, const UdfLayout &l) {
+         for (uint32_t s : {l.pdSector, l.pdSector + 16}) {
+           tvxtest::PutLe32(img, At(l, s, 188), 0x100000);
+           tvxtest::SealTag(img, At(l, s));
+         }
+       },
+       // Callbacks cannot tell the image size, so this shows at the first read.
+       0, "UDF: cannot read the file set descriptor (read error)\n"},
+      {"partition too short for the root", nullptr,
+       [&](auto *img, const UdfLayout &l) {
+         for (uint32_t s : {l.pdSector, l.pdSector + 16}) {
+           tvxtest::PutLe32(img, At(l, s, 192), 2);
+           tvxtest::SealTag(img, At(l, s));
+         }
+       },
+       0, "UDF: cannot read the root directory (corrupt structure)\n"},
+      {"partition map table longer than its descriptor", nullptr,
+       [&](auto *img, const UdfLayout &l) {
+         for (uint32_t s : {l.lvdSector, l.lvdSector + 16}) {
+           tvxtest::PutLe32(img, At(l, s, 264), 0xFFFFFF00);
+           tvxtest::SealTag(img, At(l, s));
+         }
+       },
+       0, "UDF: partition map table of 4294967040 bytes does not fit its descriptor\n"},
+      {"file set descriptor missing", nullptr,
+       [&](auto *img, const UdfLayout &l) { flipChecksum(img, At(l, l.fsdSector)); }, 0,
+       "UDF: cannot read the file set descriptor (corrupt structure)\n"},
+      {"root entry is an indirect entry to itself", nullptr,
+       [&](auto *img, const UdfLayout &l) {
+         size_t fe = At(l, l.entrySector.at(""));
+         tvxtest::PutLe16(img, fe, 259);
+         tvxtest::PutLe32(img, fe + 36, l.blockSize);
+         tvxtest::PutLe32(img, fe + 40, l.entrySector.at("") - l.partitionStart);
+         tvxtest::PutLe16(img, fe + 44, 0);
+         tvxtest::SealTag(img, fe);
+       },
+       0, "UDF: cannot read the root directory (loop)\n"},
+      {"metadata file broken, mirror used",
+       [](UdfBuildOptions *o) { o->metadataPartition = true; },
+       [&](auto *img, const UdfLayout &l) { flipChecksum(img, At(l, l.metadataFileSector)); },
+       2, ""},
+      {"metadata file and mirror broken",
+       [](UdfBuildOptions *o) { o->metadataPartition = true; },
+       [&](auto *img, const UdfLayout &l) {
+         flipChecksum(img, At(l, l.metadataFileSector));
+         flipChecksum(img, At(l, l.metadataFileSector + 1));
+       },
+       0, "UDF: cannot read the metadata file of partition 0 (corrupt structure)\n"},
+      {"file extent past the end of the image", nullptr,
+       [&](auto *img, const UdfLayout &l) {
+         size_t fe = At(l, l.entrySector.at("big.bin"));
+         tvxtest::PutLe32(img, fe + 176 + 4, 0x7FFFFFF0);
+         tvxtest::SealTag(img, fe);
+       },
+       1, ""},
+      {"size beyond the allocation descriptors", nullptr,
+       [&](auto *img, const UdfLayout &l) {
+         size_t fe = At(l, l.entrySector.at("big.bin"));
+         tvxtest::PutLe32(img, fe + 60, 1);  // 4 GiB more than recorded
+         tvxtest::SealTag(img, fe);
+       },
+       1, ""},
+      {"embedded data longer than its entry",
+       [](UdfBuildOptions *o) { o->embedSmallFiles = true; },
+       [&](auto *img, const UdfLayout &l) {
+         size_t fe = At(l, l.entrySector.at("README.TXT"));
+         tvxtest::PutLe32(img, fe + 56, 4000);
+         tvxtest::SealTag(img, fe);
+       },
+       1, ""},
+      {"allocation extent chain loops",
+       [](UdfBuildOptions *o) {
+         o->extentBlocks = 1;
+         o->adsPerEntry = 3;
+       },
+       [&](auto *img, const UdfLayout &l) {
+         // The first AED's continuation (its third descriptor) points back
+         // at itself.
+         uint32_t aed = l.aedSectors.at("big.bin").at(0);
+         tvxtest::PutLe32(img, At(l, aed, 24 + 2 * 8 + 4), aed - l.partitionStart);
+         tvxtest::SealTag(img, At(l, aed));
+       },
+       1, ""},
+      {"file identifier lengths past the directory", nullptr,
+       [&](auto *img, const UdfLayout &l) {
+         size_t fid = At(l, l.dirDataSector.at(""), 40);
+         tvxtest::PutLe16(img, fid + 36, 0xFFFF);
+         tvxtest::SealTag(img, fid);
+       },
+       1, "UDF: file identifier descriptor at offset 40 of a directory is cut short\n"},
+  };
+  const UdfNodeSpec tree = tvxtest::SampleUdfTree(20000);
+  const tvxtest::UdfTree want = Expected(tree);
+  for (const Case &c : cases) {
+    SCOPED_TRACE(c.name);
+    UdfBuildOptions opt;
+    if (c.options) c.options(&opt);
+    UdfLayout layout;
+    std::vector<uint8_t> img = tvxtest::BuildUdf(tree, opt, &layout);
+    c.damage(&img, layout);
+    tvxtest::LogCapture log;
+    bool opened = false;
+    int failures = WalkNeverLies(img, want, &opened);
+    EXPECT_EQ(opened, c.opens != 0);
+    if (opened) {
+      EXPECT_EQ(failures == 0, c.opens == 2) << failures << " entries failed";
+    }
+    if (*c.log != '\0') {
+      EXPECT_TRUE(log.Contains(c.log)) << log.All();
+    }
+  }
+}
+
+TEST(UdfHostile, NamesThatLeaveTheTreeAreHidden) {
+  UdfNodeSpec root{"", true, "", {}};
+  for (const char *bad : {"..", ".", "a/b", "../escape", ""}) {
+    root.children.push_back({bad, false, "x", {}});
+  }
+  root.children.push_back({"good", false, "ok", {}});
+  UdfLayout layout;
+  std::vector<uint8_t> img = tvxtest::BuildUdf(root, {}, &layout);
+  tvxtest::LogCapture log;
+  int closes = 0;
+  UDFVolume *vol = OpenBytes(img, &closes);
+  ASSERT_NE(vol, nullptr);
+  tvxtest::UdfTree got = tvxtest::WalkUdf(vol);
+  EXPECT_EQ(got.files.size(), 1u);
+  EXPECT_EQ(got.files["good"], "ok");
+  for (const char *path : {"..", "a/b", "../escape", "a"}) {
+    EXPECT_EQ(UDF_OpenFile(vol, nullptr, path), nullptr) << path;
+  }
+  EXPECT_TRUE(log.Contains("UDF: skipping a directory entry whose name cannot be a path component\n"));
+  UDF_Close(vol);
+}
+
+TEST(UdfHostile, DirectoryLoopAndDeepNestingAreBounded) {
+  // "loop" is recorded as a directory whose entry is the root's own.
+  UdfNodeSpec root{"", true, "", {{"loop", true, "", {}}}};
+  UdfLayout layout;
+  std::vector<uint8_t> img = tvxtest::BuildUdf(root, {}, &layout);
+  size_t fid = At(layout, layout.dirDataSector.at(""), 40);
+  tvxtest::PutLe32(&img, fid + 24, layout.entrySector.at("") - layout.partitionStart);
+  tvxtest::SealTag(&img, fid);
+  tvxtest::LogCapture log;
+  int closes = 0;
+  UDFVolume *vol = OpenBytes(img, &closes);
+  ASSERT_NE(vol, nullptr);
+  EXPECT_EQ(UDF_OpenDir(vol, nullptr, "loop"), nullptr);
+  EXPECT_EQ(UDF_OpenDir(vol, nullptr, "loop/loop/loop"), nullptr);
+  EXPECT_TRUE(log.Contains("UDF: directory structure contains a loop\n"));
+  UDF_Close(vol);
+
+  UdfNodeSpec deep{"", true, "", {}};
+  UdfNodeSpec *at = &deep;
+  std::string path;
+  for (int i = 0; i < 300; i++) {
+    at->children.push_back({"d", true, "", {}});
+    at = &at->children.back();
+    path += path.empty() ? "d" : "/d";
+  }
+  img = tvxtest::BuildUdf(deep, {}, &layout);
+  vol = OpenBytes(img, &closes);
+  ASSERT_NE(vol, nullptr);
+  UDFDir *ok = UDF_OpenDir(vol, nullptr, path.substr(0, 2 * 200 - 1).c_str());
+  EXPECT_NE(ok, nullptr);
+  UDF_CloseDir(ok);
+  EXPECT_EQ(UDF_OpenDir(vol, nullptr, path.c_str()), nullptr);
+  EXPECT_TRUE(log.Contains("UDF: directories nest deeper than 256 levels\n"));
+  UDF_Close(vol);
+  EXPECT_EQ(closes, 2);
+}
+
+TEST(UdfHostile, EveryTruncationAndEveryBrokenTag) {
+  UdfBuildOptions opt;
+  opt.metadataPartition = true;
+  opt.extentBlocks = 2;
+  opt.adsPerEntry = 3;
+  const UdfNodeSpec tree = tvxtest::SampleUdfTree(12000);
+  const tvxtest::UdfTree want = Expected(tree);
+  UdfLayout layout;
+  const std::vector<uint8_t> img = tvxtest::BuildUdf(tree, opt, &layout);
+  const size_t sectors = img.size() / layout.blockSize;
+  for (size_t s = 0; s < sectors; s++) {
+    SCOPED_TRACE(s);
+    std::vector<uint8_t> cut(img.begin(), img.begin() + static_cast<long>(s * layout.blockSize));
+    bool opened;
+    WalkNeverLies(cut, want, &opened);
+    // File data has no checksum to catch a flipped byte: only descriptors
+    // are broken.
+    if (!IsDescriptor(&img[s * layout.blockSize])) continue;
+    std::vector<uint8_t> broken = img;
+    broken[s * layout.blockSize + 4] ^= 0xFF;
+    WalkNeverLies(broken, want, &opened);
+  }
+}
