@@ -1,6 +1,11 @@
 // tvxguest media: look inside an install image the way recognition opens it
 // (UDF first, then ISO 9660), or with --iso9660 through the ISO 9660 reader
 // only.
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
 #include <cerrno>
 #include <cstdio>
 #include <cstdlib>
@@ -12,6 +17,7 @@
 #include "command.h"
 #include "json.h"
 #include "tvx_iso9660.h"
+#include "tvx_udf.h"
 
 namespace tvxcli {
 namespace {
@@ -135,6 +141,126 @@ class IsoMedium final : public Medium {
   uint32_t formats_;
 };
 
+// The UDF reader has no extraction of its own: files are copied here, with
+// the same refusals as the ISO 9660 reader's (names that would leave the
+// destination, symbolic links below it).
+bool SafeName(const std::string &name) {
+  return !name.empty() && name != "." && name != ".." && name.find('/') == std::string::npos;
+}
+
+class UdfMedium final : public Medium {
+ public:
+  explicit UdfMedium(UDFVolume *volume) : volume_(volume) {}
+  ~UdfMedium() override { UDF_Close(volume_); }
+
+  std::string ReaderName() const override { return "udf"; }
+  std::string VolumeId() override {
+    char *id = UDF_GetVolumeId(volume_);
+    std::string s = id != nullptr ? id : "";
+    std::free(id);
+    return s;
+  }
+  std::string List(const std::string &dir, std::vector<Entry> *out) override {
+    UDFDir *d = UDF_OpenDir(volume_, nullptr, dir.c_str());
+    if (d == nullptr) return "no such directory";
+    while (const char *name = UDF_ReadDir(d, 0)) {
+      out->push_back({name, UDF_DirEntryIsDir(d) != 0, UDF_DirEntrySize(d)});
+    }
+    UDF_CloseDir(d);
+    return "";
+  }
+  std::string Cat(const std::string &path, FILE *out) override {
+    return Copy(path, [out](const char *buf, size_t n) { return std::fwrite(buf, 1, n, out) == n; });
+  }
+  std::string Extract(const std::string &path, const std::string &dest) override {
+    std::string err = MakeDirs(dest);
+    if (!err.empty()) return err;
+    int fd = ::open(dest.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
+    if (fd < 0) return dest + ": " + std::strerror(errno);
+    UDFDir *d = UDF_OpenDir(volume_, nullptr, path.c_str());
+    if (d != nullptr) {
+      UDF_CloseDir(d);
+      err = ExtractDir(path, fd, 0);
+    } else {
+      size_t slash = path.find_last_of('/');
+      err = ExtractFile(path, fd, slash == std::string::npos ? path : path.substr(slash + 1));
+    }
+    ::close(fd);
+    return err;
+  }
+
+ private:
+  template <typename Sink>
+  std::string Copy(const std::string &path, Sink sink) {
+    UDFFile *f = UDF_OpenFile(volume_, nullptr, path.c_str());
+    if (f == nullptr) return "no such file";
+    uint64_t size = UDF_GetFileSize(volume_, f);
+    std::string err = size == UINT64_MAX ? "cannot read the file size" : "";
+    std::vector<char> buf(64 * 1024);
+    for (uint64_t off = 0; err.empty() && off < size;) {
+      size_t n = static_cast<size_t>(std::min<uint64_t>(buf.size(), size - off));
+      if (!UDF_PReadFile(f, buf.data(), off, n)) {
+        err = "read failed";
+      } else if (!sink(buf.data(), n)) {
+        err = std::strerror(errno);
+      }
+      off += n;
+    }
+    UDF_CloseFile(f);
+    return err;
+  }
+  static std::string MakeDirs(const std::string &path) {
+    for (size_t i = 1; i <= path.size(); ++i) {
+      if (i < path.size() && path[i] != '/') continue;
+      std::string part = path.substr(0, i);
+      if (::mkdir(part.c_str(), 0755) != 0 && errno != EEXIST) return part + ": " + std::strerror(errno);
+    }
+    return "";
+  }
+  std::string ExtractFile(const std::string &path, int dirFd, const std::string &name) {
+    if (!SafeName(name)) return "unsafe name \"" + name + "\"";
+    int fd = ::openat(dirFd, name.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_NOFOLLOW | O_CLOEXEC, 0644);
+    if (fd < 0) return name + ": " + std::strerror(errno);
+    std::string err = Copy(path, [fd](const char *buf, size_t n) {
+      for (size_t done = 0; done < n;) {
+        ssize_t w = ::write(fd, buf + done, n - done);
+        if (w < 0 && errno == EINTR) continue;
+        if (w <= 0) return false;
+        done += static_cast<size_t>(w);
+      }
+      return true;
+    });
+    if (::close(fd) != 0 && err.empty()) err = std::strerror(errno);
+    return err.empty() ? "" : path + ": " + err;
+  }
+  std::string ExtractDir(const std::string &path, int dirFd, size_t depth) {
+    if (depth >= kMaxDepth) return path + ": directories nested too deep";
+    std::vector<Entry> entries;
+    std::string err = List(path, &entries);
+    if (!err.empty()) return path + ": " + err;
+    for (const Entry &e : entries) {
+      if (!SafeName(e.path)) return "unsafe name \"" + e.path + "\"";
+    }
+    for (const Entry &e : entries) {
+      std::string inImage = path.empty() || path == "/" ? e.path : path + "/" + e.path;
+      if (!e.isDir) {
+        err = ExtractFile(inImage, dirFd, e.path);
+      } else if (::mkdirat(dirFd, e.path.c_str(), 0755) != 0 && errno != EEXIST) {
+        err = inImage + ": " + std::strerror(errno);
+      } else {
+        int sub = ::openat(dirFd, e.path.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC);
+        if (sub < 0) return inImage + ": " + std::strerror(errno);
+        err = ExtractDir(inImage, sub, depth + 1);
+        ::close(sub);
+      }
+      if (!err.empty()) return err;
+    }
+    return "";
+  }
+
+  UDFVolume *volume_;
+};
+
 std::unique_ptr<Medium> OpenIso(const std::string &path, std::string *err) {
   uint32_t formats = 0;
   Iso9660_ListFormats(path.c_str(), &formats);
@@ -151,7 +277,9 @@ std::unique_ptr<Medium> OpenIso(const std::string &path, std::string *err) {
 }
 
 std::unique_ptr<Medium> OpenMedium(const std::string &path, bool isoOnly, std::string *err) {
-  (void)isoOnly;
+  if (!isoOnly) {
+    if (UDFVolume *volume = UDF_Open(path.c_str())) return std::make_unique<UdfMedium>(volume);
+  }
   return OpenIso(path, err);
 }
 

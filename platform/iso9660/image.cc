@@ -196,6 +196,16 @@ int Image::Load(const Extent &where, Listing *out) {
     Log("Iso9660: multi-extent file without its last extent\n");
     return ISO9660_ERR_CORRUPT;
   }
+  // Mastering tools park directories relocated for depth in a root directory
+  // of their own; once every entry there shows up at its real place, the
+  // parking directory is an artefact and is not listed.
+  if (rock && where.offset == root_.extents[0].offset) {
+    std::erase_if(out->nodes, [this](const Node &n) {
+      if (!n.isDir || (n.name != "rr_moved" && n.name != ".rr_moved")) return false;
+      Listing parked;
+      return Load(n.extents[0], &parked) == ISO9660_OK && parked.nodes.empty();
+    });
+  }
   return ISO9660_OK;
 }
 

@@ -1,0 +1,57 @@
+#!/usr/bin/env bash
+# tvxguest media ls/cat/extract on the mastered ISO 9660 and bridge images.
+set -uo pipefail
+tool=${TVX_TOOL:?}
+media=${TVX_MEDIA_DIR:?}/iso9660
+src=${TVX_SOURCE_DIR:?}
+work=$(mktemp -d)
+trap 'rm -rf "$work"' EXIT
+fails=0
+check() {  # check DESCRIPTION COMMAND...
+  local what=$1
+  shift
+  if "$@"; then echo "ok   $what"; else echo "FAIL $what"; fails=$((fails + 1)); fi
+}
+status() {  # status EXPECTED COMMAND...: the command's exit status is EXPECTED
+  local want=$1
+  shift
+  "$@" >/dev/null 2>&1
+  [ $? -eq "$want" ]
+}
+
+first=$("$tool" media ls "$media/rr-joliet.iso" | head -1)
+check "ls names the reader and the volume" [ "$first" = 'iso9660 (rock ridge) volume "TVX_RR_JOLIET"' ]
+check "ls marks directories" bash -c "'$tool' media ls '$media/rr-joliet.iso' | grep -qx '           -  docs/'"
+check "ls -R shows nested files with sizes" \
+  bash -c "'$tool' media ls -R '$media/rr-joliet.iso' docs | grep -qx '       88893  big.bin'"
+plain=$("$tool" media ls "$media/plain-l1.iso" | grep -c 'KERNEL\.$')
+check "ls keeps the dot of a level-1 name" [ "$plain" = 1 ]
+bridge=$("$tool" media ls "$media/udf-bridge.iso" | head -1)
+check "a bridge image opens as UDF first" [ "${bridge%% *}" = udf ]
+forced=$("$tool" media ls --iso9660 "$media/udf-bridge.iso" | head -1)
+check "--iso9660 forces the ISO 9660 reader" [ "$forced" = 'iso9660 (rock ridge) volume "TVX_UDF_BRIDGE"' ]
+check "ls --json parses" bash -c "'$tool' media ls --json -R '$media/joliet-only.iso' | python3 -m json.tool >/dev/null"
+
+seq 1 9000 | sed 's/^/line /' > "$work/big.expected"
+for img in rr-joliet plain-l1 udf-bridge; do
+  "$tool" media cat "$media/$img.iso" docs/big.bin > "$work/big.$img"
+  check "cat $img docs/big.bin" cmp -s "$work/big.$img" "$work/big.expected"
+done
+
+# A whole tree back out equals the tree it was mastered from.
+cp -a "$src/tests/data/iso9660/tree" "$work/expected"
+cp "$work/big.expected" "$work/expected/docs/big.bin"
+for img in rr-joliet udf-bridge; do
+  check "extract / of $img equals the source tree" \
+    bash -c "'$tool' media extract '$media/$img.iso' / '$work/out-$img' && diff -r '$work/expected' '$work/out-$img' >/dev/null"
+done
+check "extract of a file lands under its own name" \
+  bash -c "'$tool' media extract '$media/rr-joliet.iso' isolinux/isolinux.cfg '$work/one' && cmp -s '$work/one/isolinux.cfg' '$src/tests/data/iso9660/tree/isolinux/isolinux.cfg'"
+
+check "missing image: status 2" status 2 "$tool" media ls "$work/none.iso"
+check "missing path: status 1" status 1 "$tool" media cat "$media/rr-joliet.iso" no/such
+check "missing directory: status 1" status 1 "$tool" media ls "$media/rr-joliet.iso" nodir
+check "unknown subcommand: status 64" status 64 "$tool" media rm x
+check "help: status 0" status 0 "$tool" media --help
+[ $fails -eq 0 ] || { echo "$fails media check(s) failed"; exit 1; }
+echo "all media checks passed"
