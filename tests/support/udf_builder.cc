@@ -259,13 +259,20 @@ class Builder {
 
   void BuildFile(const UdfNodeSpec &n, const std::string &path, uint32_t self) {
     const std::string &d = n.data;
-    if (opt_.embedSmallFiles && d.size() <= bs_ - EntryBase()) {
+    if (opt_.embedSmallFiles && n.sparseBytes == 0 && d.size() <= bs_ - EntryBase()) {
       WriteEntry(Icb(), self, 5, d.size(), 0, std::vector<uint8_t>(d.begin(), d.end()), 3);
       return;
     }
     uint32_t blocks = static_cast<uint32_t>((d.size() + bs_ - 1) / bs_);
     uint32_t per = opt_.extentBlocks == 0 ? blocks : opt_.extentBlocks;
     std::vector<Ad> list;
+    // Unrecorded extents of whole blocks, at most 1 GiB each.
+    const uint32_t maxHole = (0x3FFFFFFFu / bs_) * bs_;
+    for (uint64_t left = n.sparseBytes; left > 0;) {
+      uint32_t len = static_cast<uint32_t>(std::min<uint64_t>(left, maxHole));
+      list.push_back({len, 1, 0, 0});
+      left -= len;
+    }
     for (uint32_t b = 0; b < blocks; b += per) {
       uint32_t n2 = std::min(per, blocks - b);
       uint32_t lbn = phys_.Alloc(n2);
@@ -282,7 +289,7 @@ class Builder {
     // only long_ads can say so.
     bool longAd = opt_.longAds || opt_.metadataPartition;
     std::vector<uint8_t> ads = EncodeAds(list, longAd, path);
-    WriteEntry(Icb(), self, 5, d.size(), blocks, ads, longAd ? 1 : 0);
+    WriteEntry(Icb(), self, 5, n.sparseBytes + d.size(), blocks, ads, longAd ? 1 : 0);
   }
 
   void PutAd(std::vector<uint8_t> *out, const Ad &a, bool longAd) {

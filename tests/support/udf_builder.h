@@ -17,6 +17,9 @@ struct UdfNodeSpec {
   bool dir = false;
   std::string data;  // files
   std::vector<UdfNodeSpec> children;  // directories
+  // Files: unrecorded bytes (read as zeros) before `data`, a multiple of the
+  // block size; lets tests pass 4 GiB without storing it.
+  uint64_t sparseBytes = 0;
 };
 
 struct UdfBuildOptions {
