@@ -181,6 +181,9 @@ bool IsWritableName(const std::string &name) {
 std::string WriteDictionaryText(const std::vector<DictionaryEntry> &entries) {
   static const char kHex[] = "0123456789ABCDEF";
   std::string out;
+  // The reader drops one byte-order mark at the start; a first name that
+  // begins with those bytes must not lose them.
+  if (!entries.empty() && entries[0].name.compare(0, 3, "\xEF\xBB\xBF") == 0) out = "\xEF\xBB\xBF";
   for (const auto &e : entries) {
     out += e.name;
     out += " = \"";

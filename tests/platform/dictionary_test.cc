@@ -121,6 +121,15 @@ TEST(Dictionary, WrittenTextLoadsBackTheSameEntries) {
   EXPECT_EQ(back, All(d));
   EXPECT_EQ(back[0].second, tricky);
 
+  // A name that begins with a byte-order mark (one was in the middle of a
+  // loaded text) keeps it through a write and a re-read.
+  Dictionary *bom = Dictionary_Create();
+  ASSERT_TRUE(Dict_SetString(bom, "v", "\xEF\xBB\xBF" "name"));
+  Entries bomBack;
+  ASSERT_EQ(Parse(Take(Dictionary_WriteToBuffer(bom, nullptr)), &bomBack), "");
+  EXPECT_EQ(bomBack, All(bom));
+  Dictionary_Free(bom);
+
   tvxtest::TempDir t;
   std::string path = t.Join("cfg.tvxx");
   ASSERT_TRUE(Dictionary_WriteFile(d, path.c_str(), nullptr));
