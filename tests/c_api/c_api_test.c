@@ -94,6 +94,36 @@ static void TestAutoInstall(void) {
   free(pretty);
 }
 
+/* Answer files of a Windows guest from the shipped templates. */
+static void TestWindowsAnswers(void) {
+  const char *src = getenv("TVX_SOURCE_DIR");
+  char dir[] = "/tmp/tvx_c_api_win_XXXXXX";
+  char sif[512], xml[512], out[600];
+  static const char *const written[] = {"winnt.sif", "autoun~0.xml"};
+  size_t i;
+  phase = "windows answers";
+  if (src == NULL || mkdtemp(dir) == NULL) {
+    CHECK(!"TVX_SOURCE_DIR set and temporary directory made");
+    return;
+  }
+  snprintf(sif, sizeof sif, "%s/data/windows/winnt.sif", src);
+  snprintf(xml, sizeof xml, "%s/data/windows/autounattend.xml", src);
+  CHECK(AutoInstall_PrepareAnswerFileEx(sif, xml, NULL, NULL, "Jane Doe", "pw", "windows9-64",
+                                        GUESS_VERSION_WINDOWS_10_PLAIN, dir, NULL,
+                                        "Windows 10 Pro", TRUE, FALSE));
+  for (i = 0; i < sizeof written / sizeof written[0]; i++) {
+    FILE *f;
+    snprintf(out, sizeof out, "%s/%s", dir, written[i]);
+    f = fopen(out, "r");
+    CHECK(f != NULL);
+    if (f != NULL) fclose(f);
+    remove(out);
+  }
+  CHECK(!AutoInstall_PrepareAnswerFileEx(sif, xml, NULL, NULL, "Jane Doe", NULL, "centos7-64",
+                                         GUESS_VERSION_CENTOS_7, dir, NULL, "x", TRUE, FALSE));
+  remove(dir);
+}
+
 static void TestIso9660(void) {
   phase = "iso9660";
   Iso9660Image *image = (Iso9660Image *)&image; /* must be cleared */
@@ -129,6 +159,7 @@ int main(void) {
   TestUdf();
   TestIni();
   TestAutoInstall();
+  TestWindowsAnswers();
   if (failures == 0) printf("c_api: all phases passed\n");
   return failures == 0 ? 0 : 1;
 }

@@ -1,0 +1,103 @@
+#!/usr/bin/env bash
+# tvxguest unattended windows: answer files for recognised Windows media from
+# the shipped templates, checked with xmllint and read back; exit statuses and
+# the library's reasons on failure.
+set -uo pipefail
+tool=${TVX_TOOL:?} media=${TVX_MEDIA_DIR:?} src=${TVX_SOURCE_DIR:?}
+fail=0
+check() {  # check WHAT COND...
+  local what=$1; shift
+  if "$@"; then echo "ok: $what"; else echo "FAIL: $what"; fail=1; fi
+}
+if ! "$tool" unattended windows --help >/dev/null 2>&1; then
+  echo "skip: this tool has no 'unattended windows' command"
+  exit 0
+fi
+tmp=$(mktemp -d)
+trap 'rm -rf "$tmp"' EXIT
+tpl=$src/data/windows
+win10=$media/windows/win10-x64.iso
+winxp=$media/windows-legacy/winxppro.iso
+linux=$media/redhat/rhel5-server-x64.iso
+name='Jo & <Ann> "O'"'"'Neil" Jürgen'
+password='p&ss<w>rd'
+
+answers() {  # answers OUTDIR IMAGE EXTRA...
+  local out=$1 img=$2; shift 2
+  TZ=Asia/Tokyo "$tool" unattended windows --sif "$tpl/winnt.sif" --xml "$tpl/autounattend.xml" \
+    --storepwd "$tpl/storePwd.ini" --full-name "$name" --out "$out" "$@" "$img"
+}
+# A block runs only when its image is mastered and this build recognises it.
+usable() { [ -e "$1" ] && "$tool" detect "$1" >/dev/null 2>&1; }
+xpath() {  # xpath FILE EXPR: the string value, through the independent tool
+  xmllint --xpath "string($2)" "$1" 2>/dev/null
+}
+el() { printf "*[local-name()='%s']" "$1"; }
+oobe="//$(el settings)[@pass='oobeSystem']/$(el component)[@name='Microsoft-Windows-Shell-Setup']"
+
+if usable "$win10"; then
+  answers "$tmp/w10" "$win10" --image-name "Windows 10 Pro" --password "$password" \
+    --product-key AAAAA-BBBBB-CCCCC-DDDDD-EEEEE >"$tmp/out" 2>"$tmp/err"
+  check "win10: exit 0" test $? -eq 0
+  check "win10: names the three files" test "$(grep -c '^wrote ' "$tmp/out")" -eq 3
+  xml=$tmp/w10/autoun~0.xml
+  check "win10: xmllint accepts the XML" xmllint --noout "$xml"
+  check "win10: account name intact" \
+    test "$(xpath "$xml" "$oobe/$(el AutoLogon)/$(el Username)")" = "$name"
+  check "win10: password intact" \
+    test "$(xpath "$xml" "$oobe/$(el AutoLogon)/$(el Password)/$(el Value)")" = "$password"
+  check "win10: host time zone" \
+    test "$(xpath "$xml" "$oobe/$(el TimeZone)")" = "Tokyo Standard Time"
+  check "win10: four first-logon commands" \
+    test "$(xpath "$xml" "count($oobe/$(el FirstLogonCommands)/*)")" = 4
+  check "win10: winnt.sif time-zone index" grep -qx 'TimeZone=235' "$tmp/w10/winnt.sif"
+  check "win10: winnt.sif name in windows-1252" \
+    grep -q "^FullName=\"Jo & <Ann> \"O'Neil\" J$(printf '\374')rgen\"" "$tmp/w10/winnt.sif"
+
+  answers "$tmp/w10j" "$win10" --image-name "Windows 10 Pro" --json >"$tmp/json" 2>&1
+  check "win10 --json: result and files" /usr/bin/python3 -c '
+import json, sys
+o = json.load(open(sys.argv[1]))
+assert o["result"] is True and o["guestOS"] == "windows9-64", o
+assert [f.rsplit("/", 1)[1] for f in o["files"]] == ["winnt.sif", "autoun~0.xml", "storePwd.ini"]
+' "$tmp/json"
+
+  # A template that cannot be copied: exit 1 and the library's reason.
+  "$tool" unattended windows --sif "$tpl/winnt.sif" --xml "$tmp/absent.xml" --image-name x \
+    --full-name y --out "$tmp/bad" "$win10" >/dev/null 2>"$tmp/err"
+  check "missing template: exit 1" test $? -eq 1
+  check "missing template: reason shown" grep -qF \
+    "AutoInstall_PrepareAnswerFileEx: File_Copy from=\"$tmp/absent.xml\" to=\"$tmp/bad/autoun~0.xml\"" \
+    "$tmp/err"
+else
+  echo "skip: $win10 not mastered or not recognised"
+fi
+
+if usable "$winxp"; then
+  answers "$tmp/xp" "$winxp" --image-name "Windows XP Professional" --password pw \
+    --no-autologon >/dev/null 2>&1
+  check "winxp: exit 0" test $? -eq 0
+  check "winxp: both answer files" test -s "$tmp/xp/winnt.sif" -a -s "$tmp/xp/autoun~0.xml"
+  check "winxp: logon keys in winnt.sif" grep -qx 'AutoLogonCount=1' "$tmp/xp/winnt.sif"
+  check "winxp: logon helper told to stop" grep -qx 'Enabled=0' "$tmp/xp/storePwd.ini"
+  check "winxp: xmllint accepts the XML" xmllint --noout "$tmp/xp/autoun~0.xml"
+else
+  echo "skip: $winxp not mastered or not recognised"
+fi
+
+if usable "$linux"; then
+  answers "$tmp/lx" "$linux" --image-name x >/dev/null 2>"$tmp/err"
+  check "linux image: exit 1" test $? -eq 1
+  check "linux image: reason shown" grep -q 'GuestOS_IsWin failed for guestID rhel5' "$tmp/err"
+  check "linux image: nothing written" test -z "$(ls -A "$tmp/lx" 2>/dev/null)"
+fi
+
+"$tool" unattended windows --sif a --xml b --image-name c --full-name d --out "$tmp/n" \
+  "$tmp/no-such.iso" >/dev/null 2>&1
+check "unreadable image: exit 2" test $? -eq 2
+"$tool" unattended windows --xml b "$tmp/no-such.iso" >/dev/null 2>"$tmp/err"
+check "missing --sif: exit 64" test $? -eq 64
+check "missing --sif: says so" grep -q -- '--sif is required' "$tmp/err"
+"$tool" unattended windows --help | grep -q -- '--keep-partitions'
+check "help lists the options" test $? -eq 0
+exit $fail

@@ -1,0 +1,267 @@
+// tvxguest unattended windows: recognise a Windows install image and write
+// its answer files. It joins the `unattended` command group, and is left out
+// of a tool built without that group.
+#if __has_include("command_group.h") && __has_include("unattended_common.h")
+#include <cstdio>
+#include <cstdlib>
+#include <filesystem>
+#include <fstream>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "command.h"
+#include "json.h"
+#include "tvx_autoinstall.h"
+#include "tvx_autoinstall_windows.h"
+#include "tvx_guess.h"
+#include "tvx_log.h"
+#include "command_group.h"
+#include "unattended_common.h"
+
+namespace tvxcli {
+namespace {
+
+constexpr char kName[] = "unattended windows";
+
+void PrintHelp() {
+  std::printf(
+      "Usage: tvxguest unattended windows [OPTIONS] --out DIR IMAGE\n\n"
+      "Recognise the Windows install image IMAGE and write its answer files into DIR\n"
+      "(created when missing): winnt.sif, autoun~0.xml and, with --storepwd, storePwd.ini.\n\n"
+      "Options:\n"
+      "  --sif FILE            template of winnt.sif (required)\n"
+      "  --xml FILE            template of the unattend XML (required)\n"
+      "  --storepwd FILE       template of storePwd.ini\n"
+      "  --image-name NAME     Windows image to install, e.g. \"Windows 10 Pro\" (required)\n"
+      "  --full-name NAME      owner and local account name (required)\n"
+      "  --password TEXT       account password (default: none)\n"
+      "  --password-file FILE  read the password from the first line of FILE\n"
+      "  --product-key KEY     product key (default: none)\n"
+      "  --language LANG       installation language (default: en-US, or English\n"
+      "                        before Vista)\n"
+      "  --no-autologon        stop automatic logon after the first logon\n"
+      "  --keep-partitions     keep the template's disk layout\n"
+      "  --out DIR             output directory (required)\n"
+      "  --json                print one JSON object instead of text\n"
+      "  -h, --help            show this help\n\n"
+      "Exit status: 0 written, 1 not recognised or not written, 2 IMAGE cannot be\n"
+      "opened, 64 usage error. Templates ship in share/tvxguest/windows.\n");
+}
+
+struct Options {
+  std::string sif, xml, storePwd, imageName, fullName, password, productKey, language, out, image;
+  bool haveStorePwd = false, havePassword = false, haveKey = false, haveLanguage = false;
+  bool autoLogon = true, keepPartitions = false, json = false;
+};
+
+bool ReadFirstLine(const std::string &path, std::string *out) {
+  std::ifstream in(path);
+  if (!in) return false;
+  std::getline(in, *out);
+  if (!out->empty() && out->back() == '\r') out->pop_back();
+  return true;
+}
+
+// Parse fills `o`; returns -1 to go on, else the exit status.
+int Parse(const std::vector<std::string> &args, Options *o) {
+  struct Valued {
+    const char *flag;
+    std::string *value;
+    bool *given;
+  };
+  std::string passwordFile;
+  bool havePasswordFile = false, ignored = false;
+  const Valued valued[] = {
+      {"--sif", &o->sif, &ignored},
+      {"--xml", &o->xml, &ignored},
+      {"--storepwd", &o->storePwd, &o->haveStorePwd},
+      {"--image-name", &o->imageName, &ignored},
+      {"--full-name", &o->fullName, &ignored},
+      {"--password", &o->password, &o->havePassword},
+      {"--password-file", &passwordFile, &havePasswordFile},
+      {"--product-key", &o->productKey, &o->haveKey},
+      {"--language", &o->language, &o->haveLanguage},
+      {"--out", &o->out, &ignored},
+  };
+  std::vector<std::string> positional;
+  for (size_t i = 0; i < args.size(); ++i) {
+    const std::string &a = args[i];
+    if (IsHelp(a)) {
+      PrintHelp();
+      return 0;
+    }
+    if (a == "--json") {
+      o->json = true;
+      continue;
+    }
+    if (a == "--no-autologon") {
+      o->autoLogon = false;
+      continue;
+    }
+    if (a == "--keep-partitions") {
+      o->keepPartitions = true;
+      continue;
+    }
+    if (a.size() > 1 && a[0] == '-') {
+      bool known = false;
+      for (const Valued &v : valued) {
+        std::string flag = v.flag;
+        if (a == flag) {
+          if (i + 1 >= args.size()) return UsageError(kName, a + " needs a value");
+          *v.value = args[++i];
+        } else if (a.rfind(flag + "=", 0) == 0) {
+          *v.value = a.substr(flag.size() + 1);
+        } else {
+          continue;
+        }
+        *v.given = known = true;
+        break;
+      }
+      if (!known) return UsageError(kName, "unknown option '" + a + "'");
+      continue;
+    }
+    positional.push_back(a);
+  }
+  if (positional.size() != 1) return UsageError(kName, "expected exactly one IMAGE");
+  o->image = positional[0];
+  const std::pair<const std::string *, const char *> required[] = {
+      {&o->sif, "--sif"},
+      {&o->xml, "--xml"},
+      {&o->imageName, "--image-name"},
+      {&o->fullName, "--full-name"},
+      {&o->out, "--out"},
+  };
+  for (const auto &[value, flag] : required) {
+    if (value->empty()) return UsageError(kName, std::string(flag) + " is required");
+  }
+  if (havePasswordFile) {
+    if (o->havePassword) return UsageError(kName, "give --password or --password-file, not both");
+    if (!ReadFirstLine(passwordFile, &o->password)) {
+      std::fprintf(stderr, "tvxguest %s: cannot read %s\n", kName, passwordFile.c_str());
+      return 1;
+    }
+    o->havePassword = true;
+  }
+  return -1;
+}
+
+void Capture(TvxLogLevel, const char *text, void *ctx) {
+  std::string line = text;
+  if (!line.empty() && line.back() == '\n') line.pop_back();
+  static_cast<std::vector<std::string> *>(ctx)->push_back(line);
+}
+
+// Editions of a Vista-or-newer medium come as "name?name?...".
+std::vector<std::string> SplitEditions(const char *list) {
+  std::vector<std::string> out;
+  std::string cur;
+  for (const char *p = list; *p != '\0'; ++p) {
+    if (*p == '?') {
+      if (!cur.empty()) out.push_back(cur);
+      cur.clear();
+    } else {
+      cur += *p;
+    }
+  }
+  if (!cur.empty()) out.push_back(cur);
+  return out;
+}
+
+int Run(const std::vector<std::string> &args) {
+  Options o;
+  int rc = Parse(args, &o);
+  if (rc >= 0) return rc;
+
+  GuessResult guess;
+  int guessRc = RecogniseImage(kName, o.image, &guess);
+  if (guessRc != 0 || guess.guestOS == nullptr) {
+    if (o.json) {
+      std::printf("%s\n", JsonObject()
+                              .Bool("result", false)
+                              .Num("guessResult", guessRc)
+                              .StrOrNull("guestOS", nullptr)
+                              .Text()
+                              .c_str());
+    } else if (guessRc != 2) {
+      std::fprintf(stderr, "tvxguest %s: no guest OS recognised on %s\n", kName,
+                   o.image.c_str());
+    }
+    return guessRc == 2 ? 2 : 1;
+  }
+
+  bool supported = AutoInstall_IsSupportedGuest(&guess);
+  if (!supported && !o.json) {
+    std::fprintf(stderr, "tvxguest %s: note: unattended install is not offered for %s\n", kName,
+                 GuestLabel(guess).c_str());
+  }
+  std::vector<std::string> editions = SplitEditions(guess.editions);
+  bool offered = editions.empty();
+  for (const std::string &e : editions) offered = offered || e == o.imageName;
+  if (!offered && !o.json) {
+    std::fprintf(stderr, "tvxguest %s: note: the medium does not list \"%s\"; it offers:\n",
+                 kName, o.imageName.c_str());
+    for (const std::string &e : editions) std::fprintf(stderr, "  %s\n", e.c_str());
+  }
+
+  std::error_code ec;
+  std::filesystem::create_directories(o.out, ec);
+  if (ec) {
+    std::fprintf(stderr, "tvxguest %s: cannot create %s: %s\n", kName, o.out.c_str(),
+                 ec.message().c_str());
+    return 1;
+  }
+
+  // The library's reasons are collected so that a failure can show them
+  // without -v.
+  std::vector<std::string> log;
+  if (!Verbose()) Tvx_SetLogSink(Capture, &log);
+  Bool ok = AutoInstall_PrepareAnswerFileEx(
+      o.sif.c_str(), o.xml.c_str(), o.haveStorePwd ? o.storePwd.c_str() : nullptr,
+      o.haveKey ? o.productKey.c_str() : nullptr, o.fullName.c_str(),
+      o.havePassword ? o.password.c_str() : nullptr, guess.guestOS,
+      static_cast<GuessVersion>(guess.version), o.out.c_str(),
+      o.haveLanguage ? o.language.c_str() : nullptr, o.imageName.c_str(), o.autoLogon,
+      o.keepPartitions);
+  if (!Verbose()) Tvx_SetLogSink(nullptr, nullptr);
+
+  std::vector<std::string> files;
+  for (const char *name : {"winnt.sif", "autoun~0.xml", "storePwd.ini"}) {
+    std::string path = (std::filesystem::path(o.out) / name).string();
+    if (ok && (o.haveStorePwd || std::string(name) != "storePwd.ini")) files.push_back(path);
+  }
+  const char *versionName =
+      guess.version < GUESS_VERSION_DUMMY_LAST
+          ? Guess_GetSubString(static_cast<GuessVersion>(guess.version))
+          : "";
+  if (o.json) {
+    std::printf("%s\n", JsonObject()
+                            .Bool("result", ok)
+                            .Str("guestOS", guess.guestOS)
+                            .Num("version", guess.version)
+                            .Str("versionName", versionName != nullptr ? versionName : "")
+                            .Bool("supported", supported)
+                            .Bool("imageListed", offered)
+                            .StrArray("files", files)
+                            .StrArray("log", log)
+                            .Text()
+                            .c_str());
+    return ok ? 0 : 1;
+  }
+  std::printf("%s: %s\n", o.image.c_str(), GuestLabel(guess).c_str());
+  if (!ok) {
+    std::fprintf(stderr, "tvxguest %s: the answer files were not written\n", kName);
+    for (const std::string &line : log) std::fprintf(stderr, "  %s\n", line.c_str());
+    return 1;
+  }
+  for (const std::string &f : files) std::printf("wrote %s\n", f.c_str());
+  return 0;
+}
+
+const SubcommandRegistration kRegistration(
+    kUnattendedGroup, {"windows", "write the Windows answer files for an install image", Run});
+
+}  // namespace
+}  // namespace tvxcli
+
+#endif
