@@ -1,15 +1,28 @@
 #include "lib/ini/ini_line.h"
 
+#include <algorithm>
 #include <cstring>
 
 namespace tvx::ini {
 
 bool LineReader::Next(std::string *piece) {
   piece->clear();
-  int c;
-  while (piece->size() < kMaxPiece && (c = std::getc(f_)) != EOF) {
-    piece->push_back(static_cast<char>(c));
-    if (c == '\n') break;
+  while (piece->size() < kMaxPiece) {
+    if (pos_ == buf_.size()) {
+      buf_.resize(64 * 1024);
+      size_t n = std::fread(buf_.data(), 1, buf_.size(), f_);
+      buf_.resize(n);
+      pos_ = 0;
+      if (n == 0) break;
+    }
+    size_t want = std::min(kMaxPiece - piece->size(), buf_.size() - pos_);
+    const char *start = buf_.data() + pos_;
+    const void *nl = std::memchr(start, '\n', want);
+    size_t take = nl != nullptr ? static_cast<size_t>(static_cast<const char *>(nl) - start) + 1
+                                : want;
+    piece->append(start, take);
+    pos_ += take;
+    if (nl != nullptr) break;
   }
   return !piece->empty();
 }

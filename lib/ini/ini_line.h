@@ -31,6 +31,8 @@ class LineReader {
 
  private:
   FILE *f_;
+  std::string buf_;
+  size_t pos_ = 0;
 };
 
 enum class LineKind { kComment, kHeader, kKey };

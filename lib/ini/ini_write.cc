@@ -40,8 +40,8 @@ std::string_view StructureView(const std::string &piece) {
 // would break out of their line, are refused rather than written.
 bool Writable(std::string_view section, std::string_view key, std::string_view value) {
   if (section.find_first_of("]\n;") != std::string_view::npos) return false;
-  if (key.find_first_of("=\n;") != std::string_view::npos) return false;
-  if (!key.empty() && (key[0] == '[' || key[0] == ' ' || key[0] == '\t')) return false;
+  if (key.empty() || key.find_first_of("=\r\n;") != std::string_view::npos) return false;
+  if (key[0] == '[' || key[0] == ' ' || key[0] == '\t') return false;
   if (value.find('\n') != std::string_view::npos) return false;
   // A new key or header line must fit one line piece.
   return section.size() + 3 <= kMaxPiece && key.size() + 4 <= kMaxPiece;

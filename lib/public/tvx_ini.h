@@ -75,8 +75,9 @@ TVX_EXPORT Bool IniUtil_GetIniFileInt(const char *path, const char *section,
  * line lacks its "]", the text would exceed the size limit, or the new file
  * cannot be written (no space, no permission on the directory). Also refused:
  * a line break in any argument, and a section or key that the reading rules
- * could never find again (a section holding "]" or ";", a key holding "=" or
- * ";" or beginning with "[" or a blank, either too long for one line). A
+ * could never find again (a section holding "]" or ";"; an empty key, or one
+ * holding "=", ";" or a CR, or beginning with "[" or a blank; either too long
+ * for one line). A
  * value too long for its line is clipped so that the line stays within 1023
  * bytes. When the old key line was longer than one piece, its remaining
  * pieces go with the old value. */

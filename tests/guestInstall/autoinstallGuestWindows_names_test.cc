@@ -4,6 +4,8 @@
 #include <cstdlib>
 #include <string>
 
+#include "platform/msg.h"
+#include "support/log_capture.h"
 #include "tvx_autoinstall.h"
 
 namespace {
@@ -51,6 +53,34 @@ TEST(WindowsPrettyName, KeysAndModifiers) {
     std::free(pretty);
   }
   EXPECT_EQ(nullptr, AutoInstall_GetPrettyWindowsName(nullptr));
+}
+
+// Every part of the display name, and the refusal message, come from the
+// catalogue of the current locale.
+TEST(WindowsPrettyName, LocalisedParts) {
+  tvxtest::TempDir dir;
+  std::string path = dir.Join("de.txt");
+  tvxtest::WriteFileOrDie(path,
+                          "msg.autoinstall.winpfx_2k8 = \"Windows Server 2008 (de)\"\n"
+                          "msg.autoinstall.winsrv_standard = \" Standardversion\"\n"
+                          "msg.autoinstall.winsfx_core = \" Kern\"\n"
+                          "msg.autoinstall.prettyFormat = \"%s:%s:%s\"\n"
+                          "msg.autoinstall.bad_windows_name = \"Unzulaessiger Name.\"\n");
+  ASSERT_TRUE(Msg_LoadCatalogue("de", path.c_str()));
+  Msg_SetLocale("de");
+  char *pretty = AutoInstall_GetPrettyWindowsName("Windows Longhorn SERVERSTANDARDCORE");
+  char *plain = AutoInstall_GetPrettyWindowsName("Windows 7 CUSTOM");
+  char *message = nullptr;
+  AutoInstallTextError error =
+      AutoInstallValidateWindowsText(nullptr, "a,b", AUTOINSTALL_TEXT_NAME, &message);
+  Msg_SetLocale("");
+  EXPECT_STREQ("Windows Server 2008 (de): Standardversion: Kern", pretty);
+  EXPECT_STREQ("Windows 7 CUSTOM", plain);
+  EXPECT_EQ(AUTOINSTALL_TEXT_BAD_WINDOWS_NAME, error);
+  EXPECT_STREQ("Unzulaessiger Name.", message);
+  std::free(pretty);
+  std::free(plain);
+  std::free(message);
 }
 
 }  // namespace

@@ -76,6 +76,8 @@ TEST(IniWrite, RefusalsLeaveFileUnchanged) {
       {"; in key", "[A]\n", "A", "K;L", "1", FALSE, nullptr},
       {"key looks like a header", "[A]\n", "A", "[K", "1", FALSE, nullptr},
       {"key with leading blank", "[A]\n", "A", " K", "1", FALSE, nullptr},
+      {"empty key", "[A]\n", "A", "", "1", FALSE, nullptr},
+      {"CR in key", "[A]\n", "A", "K\r", "1", FALSE, nullptr},
   };
   TempDir dir;
   std::string path = dir.Join("t.ini");
