@@ -1,8 +1,9 @@
 # Unattended install on the sample images: whether it is offered and with
 # which limits, then one refused answer per family, as the host would show it.
-echo "== unattended: support and answer limits of each recognised image"
+source "$root/scripts/demo.d/samples.bash"
+echo "== unattended: support and answer limits of the sample images"
 linux_img="" windows_img=""
-while IFS= read -r -d '' img; do
+while IFS= read -r img; do
   json=$("$tool" unattended support --json "$img" 2>/dev/null) || true
   [ -n "$json" ] || continue
   line=$(/usr/bin/python3 - "${img#"$media"/}" "$json" <<'PY'
@@ -13,7 +14,7 @@ if o["guestOS"] is None:
 c = o["config"] or {}
 limits = "user %s, name %s, password %s" % (
     c.get("shortNameMaxLength") or "-", c.get("nameMaxLength"), c.get("passwordMaxLength"))
-print("%s\t%s\t  %-40s %-20s %-12s %s" % (o["family"], "1" if o["supported"] else "0",
+print("%s\t%s\t  %-40s %-22s %-12s %s" % (o["family"], "1" if o["supported"] else "0",
       sys.argv[1], o["guestOS"], "offered" if o["supported"] else "not offered", limits))
 PY
 )
@@ -22,7 +23,7 @@ PY
   echo "$text"
   if [ "$offered" = 1 ] && [ "$family" = linux ] && [ -z "$linux_img" ]; then linux_img=$img; fi
   if [ "$offered" = 1 ] && [ "$family" = windows ] && [ -z "$windows_img" ]; then windows_img=$img; fi
-done < <(find "$media" -name '*.iso' -print0 | sort -z)
+done < <(demo_images)
 
 for pair in "linux|short-name|Bob" "windows|name|Doe, John"; do
   IFS='|' read -r family kind text <<<"$pair"

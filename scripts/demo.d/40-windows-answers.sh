@@ -4,8 +4,6 @@
 win_img=$media/windows/win10-x64.iso
 if [ ! -e "$win_img" ]; then
   echo "== windows answers: skipped (no sample Windows 10 medium)"
-elif ! "$tool" unattended windows --help >/dev/null 2>&1; then
-  echo "== windows answers: skipped (no 'unattended windows' command in this tool)"
 else
   win_out=$work/windows-answers
   win_name="Jo & Ann O'Neil"

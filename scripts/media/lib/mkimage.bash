@@ -45,14 +45,25 @@ image() {
     mkdir -p "$TVX_GUESS_SEEDS"
     seed_of "$tree" "$volid" >"$TVX_GUESS_SEEDS/$(basename "$outdir")-$name"
   fi
+  # The mastering tool's chatter is kept aside and shown only when it fails,
+  # so that a failure under `set -e` never goes unexplained.
+  local rc=0 log
+  log=$(mktemp)
   case $mode in
-    rr) xorriso -as mkisofs -R -J -quiet -no-pad -V "$volid" -o "$outdir/$name.iso" "$tree" 2>/dev/null ;;
-    plain) xorriso -as mkisofs -quiet -no-pad -V "$volid" -o "$outdir/$name.iso" "$tree" 2>/dev/null ;;
-    udf) genisoimage -quiet -udf -R -J -V "$volid" -o "$outdir/$name.iso" "$tree" 2>/dev/null ;;
+    rr) xorriso -as mkisofs -R -J -quiet -no-pad -V "$volid" -o "$outdir/$name.iso" "$tree" \
+          2>"$log" || rc=$? ;;
+    plain) xorriso -as mkisofs -quiet -no-pad -V "$volid" -o "$outdir/$name.iso" "$tree" \
+          2>"$log" || rc=$? ;;
+    udf) genisoimage -quiet -udf -R -J -V "$volid" -o "$outdir/$name.iso" "$tree" \
+          2>"$log" || rc=$? ;;
   esac
-  local rc=$?
   rm -rf "$tree"
-  [ $rc -eq 0 ] || { echo "image: mastering $name failed" >&2; return 1; }
+  if [ $rc -ne 0 ]; then
+    echo "image: mastering $name failed (exit $rc):" >&2
+    cat "$log" >&2
+  fi
+  rm -f "$log"
+  return $rc
 }
 
 # seed_of TREE VOLID: the tree as entries separated by \x01, each a path
