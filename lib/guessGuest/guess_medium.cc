@@ -119,7 +119,12 @@ bool FindIso(GuessMedium *medium, GuessDir *dir, const char *name, bool wantData
   }
   bool ok = false;
   Iso9660File *file = nullptr;
-  if (found && Iso9660_OpenFile(medium->isoImage, &entry, &file) == ISO9660_OK) {
+  if (found && !wantData && entry.isDirectory) {
+    // Some media mark themselves by a folder (an application bundle), so a
+    // presence test counts directories; only their data cannot be read.
+    if (out_size != nullptr) *out_size = 0;
+    ok = true;
+  } else if (found && Iso9660_OpenFile(medium->isoImage, &entry, &file) == ISO9660_OK) {
     if (!wantData) {
       if (out_size != nullptr) *out_size = 0;
       ok = true;
@@ -136,7 +141,15 @@ bool FindIso(GuessMedium *medium, GuessDir *dir, const char *name, bool wantData
 bool FindUdf(GuessMedium *medium, GuessDir *dir, const char *name, bool wantData,
              char **out_data, uint64_t *out_size) {
   UDFFile *file = UDF_OpenFile(medium->udfVolume, dir->udfDir, name);
-  if (file == nullptr) return false;
+  if (file == nullptr) {
+    // As on ISO 9660, a presence test also finds a directory of that name.
+    if (wantData) return false;
+    UDFDir *sub = UDF_OpenDir(medium->udfVolume, dir->udfDir, name);
+    if (sub == nullptr) return false;
+    UDF_CloseDir(sub);
+    if (out_size != nullptr) *out_size = 0;
+    return true;
+  }
   bool ok = true;
   if (wantData) {
     uint64_t size = UDF_GetFileSize(medium->udfVolume, file);

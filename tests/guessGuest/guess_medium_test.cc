@@ -128,7 +128,8 @@ TEST(GuessMedium, ReadFileFailsOnMissingNamesAndDirectories) {
 }
 
 // FileExists tries the directory's case variants but the name only as given:
-// ISO 9660 compares names without case anyway, UDF exactly.
+// ISO 9660 compares names without case anyway, UDF exactly. A directory is
+// present too (installer bundles are folders), though it cannot be read.
 TEST(GuessMedium, FileExistsMatchesNameCaseAsTheFormatDoes) {
   struct Case {
     const char *image;
@@ -140,7 +141,9 @@ TEST(GuessMedium, FileExistsMatchesNameCaseAsTheFormatDoes) {
       {"rr", "isolinux", "ISOLINUX.CFG", true},  {"plain", "ISOLINUX", "isolinux.cfg", true},
       {"plain", "isolinux", "isolinux.cfg", true}, {"udf", "isolinux", "isolinux.cfg", true},
       {"udf", "ISOLINUX", "isolinux.cfg", true}, {"udf", "isolinux", "ISOLINUX.CFG", false},
-      {"rr", "", "README", true},                {"rr", "", "isolinux", false},  // a directory
+      {"rr", "", "README", true},                {"rr", "", "isolinux", true},
+      {"udf", "", "isolinux", true},             {"udf", "", "ISOLINUX", false},
+      {"plain", "", "ISOLINUX", true},
       {"rr", "", "", false},                     {"rr", "nodir", "README", false},
   };
   for (const Case &c : cases) {

@@ -91,6 +91,8 @@ TEST(GuessRecogniserExits, RecognitionOverwritesAFilledResult) {
       {Guess_Solaris, "solaris/sol9", "solaris9", nullptr},
       {Guess_Solaris, "solaris/sol10", "solaris10", "solaris10-64"},
       {Guess_MacOS, "macos/lion", "darwin11", "darwin11-64"},
+      {Guess_MacOS, "macos/lion-udf", "darwin11", "darwin11-64"},
+      {Guess_MacOS, "macos/lion-file", "darwin11", "darwin11-64"},
       {Guess_MacOS, "macos/bootcamp-root", "darwin", "darwin-64"},
       {Guess_MacOS, "macos/bootcamp-docs", "darwin10", "darwin10-64"},
       {Guess_FreeBSD, "freebsd/fbsd13-64", "freeBSD13-64", "other-64"},
