@@ -5,7 +5,7 @@
 
 #include <string>
 
-#include "lib/guestInstall/unattend_xml_support.h"
+#include "support/unattend_xml.h"
 #include "platform/raii.h"
 #include "support/log_capture.h"
 

@@ -8,7 +8,7 @@
 #include <string>
 #include <vector>
 
-#include "lib/guestInstall/unattend_xml_support.h"
+#include "support/unattend_xml.h"
 #include "support/log_capture.h"
 #include "tvx_autoinstall_windows.h"
 #include "tvx_ini.h"
