@@ -10,6 +10,7 @@
 #include <strings.h>
 
 #include "platform/fat_internal.h"
+#include "platform/utf8.h"
 #include "platform/util.h"
 
 using tvx::Le16;
@@ -28,36 +29,10 @@ uint8_t Checksum(const uint8_t *shortName) {
   return sum;
 }
 
-void AppendUtf8(std::string *out, uint32_t cp) {
-  if (cp < 0x80) {
-    out->push_back(static_cast<char>(cp));
-  } else if (cp < 0x800) {
-    out->push_back(static_cast<char>(0xC0 | (cp >> 6)));
-    out->push_back(static_cast<char>(0x80 | (cp & 0x3F)));
-  } else if (cp < 0x10000) {
-    out->push_back(static_cast<char>(0xE0 | (cp >> 12)));
-    out->push_back(static_cast<char>(0x80 | ((cp >> 6) & 0x3F)));
-    out->push_back(static_cast<char>(0x80 | (cp & 0x3F)));
-  } else {
-    out->push_back(static_cast<char>(0xF0 | (cp >> 18)));
-    out->push_back(static_cast<char>(0x80 | ((cp >> 12) & 0x3F)));
-    out->push_back(static_cast<char>(0x80 | ((cp >> 6) & 0x3F)));
-    out->push_back(static_cast<char>(0x80 | (cp & 0x3F)));
-  }
-}
 
 std::string Utf16ToUtf8(const std::vector<uint16_t> &units) {
   std::string out;
-  for (size_t i = 0; i < units.size(); i++) {
-    uint32_t u = units[i];
-    if (u >= 0xD800 && u < 0xDC00 && i + 1 < units.size() && units[i + 1] >= 0xDC00 &&
-        units[i + 1] < 0xE000) {
-      u = 0x10000 + ((u - 0xD800) << 10) + (units[++i] - 0xDC00);
-    } else if (u >= 0xD800 && u < 0xE000) {
-      u = 0xFFFD;
-    }
-    AppendUtf8(&out, u);
-  }
+  tvx::utf8::AppendUtf16(units.size(), [&units](size_t i) { return units[i]; }, &out);
   return out;
 }
 

@@ -6,6 +6,7 @@
 #include "platform/iso9660/names.h"
 
 #include "platform/iso9660/ecma119.h"
+#include "platform/utf8.h"
 
 namespace tvx::iso9660 {
 namespace {
@@ -21,23 +22,6 @@ constexpr uint32_t kModeTypeMask = 0170000;
 constexpr uint32_t kModeSymlink = 0120000;
 constexpr uint32_t kModeDirectory = 0040000;
 
-void AppendUtf8(uint32_t cp, std::string *out) {
-  if (cp < 0x80) {
-    out->push_back(static_cast<char>(cp));
-  } else if (cp < 0x800) {
-    out->push_back(static_cast<char>(0xC0 | (cp >> 6)));
-    out->push_back(static_cast<char>(0x80 | (cp & 0x3F)));
-  } else if (cp < 0x10000) {
-    out->push_back(static_cast<char>(0xE0 | (cp >> 12)));
-    out->push_back(static_cast<char>(0x80 | ((cp >> 6) & 0x3F)));
-    out->push_back(static_cast<char>(0x80 | (cp & 0x3F)));
-  } else {
-    out->push_back(static_cast<char>(0xF0 | (cp >> 18)));
-    out->push_back(static_cast<char>(0x80 | ((cp >> 12) & 0x3F)));
-    out->push_back(static_cast<char>(0x80 | ((cp >> 6) & 0x3F)));
-    out->push_back(static_cast<char>(0x80 | (cp & 0x3F)));
-  }
-}
 
 // Length of the valid UTF-8 sequence at s[i], or 0.
 size_t Utf8SeqLen(std::string_view s, size_t i) {
@@ -85,7 +69,7 @@ std::string ToUtf8(std::string_view bytes) {
   for (size_t i = 0; i < bytes.size();) {
     size_t n = Utf8SeqLen(bytes, i);
     if (n == 0) {
-      AppendUtf8(static_cast<unsigned char>(bytes[i]), &out);
+      utf8::Append(static_cast<unsigned char>(bytes[i]), &out);
       ++i;
     } else {
       out.append(bytes.substr(i, n));
@@ -106,20 +90,8 @@ std::string IsoName(std::string_view id) { return ToUtf8(DropVersion(id)); }
 
 std::string JolietName(std::string_view id) {
   std::string out;
-  size_t units = id.size() / 2;
-  for (size_t i = 0; i < units; ++i) {
-    uint32_t u = Be16(reinterpret_cast<const uint8_t *>(id.data()) + 2 * i);
-    if (u >= 0xD800 && u <= 0xDBFF && i + 1 < units) {
-      uint32_t lo = Be16(reinterpret_cast<const uint8_t *>(id.data()) + 2 * (i + 1));
-      if (lo >= 0xDC00 && lo <= 0xDFFF) {
-        AppendUtf8(0x10000 + ((u - 0xD800) << 10) + (lo - 0xDC00), &out);
-        ++i;
-        continue;
-      }
-    }
-    if (u >= 0xD800 && u <= 0xDFFF) u = 0xFFFD;
-    AppendUtf8(u, &out);
-  }
+  const auto *p = reinterpret_cast<const uint8_t *>(id.data());
+  utf8::AppendUtf16(id.size() / 2, [p](size_t i) { return Be16(p + 2 * i); }, &out);
   return std::string(DropVersion(out));
 }
 

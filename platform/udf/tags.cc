@@ -3,6 +3,7 @@
 #include <array>
 
 #include "platform/udf/udf_internal.h"
+#include "platform/utf8.h"
 
 namespace tvx::udf {
 
@@ -36,23 +37,6 @@ constexpr std::array<uint16_t, 256> MakeCrcTable() {
 
 constexpr std::array<uint16_t, 256> kCrcTable = MakeCrcTable();
 
-void AppendUtf8(uint32_t cp, std::string *out) {
-  if (cp < 0x80) {
-    out->push_back(static_cast<char>(cp));
-  } else if (cp < 0x800) {
-    out->push_back(static_cast<char>(0xC0 | (cp >> 6)));
-    out->push_back(static_cast<char>(0x80 | (cp & 0x3F)));
-  } else if (cp < 0x10000) {
-    out->push_back(static_cast<char>(0xE0 | (cp >> 12)));
-    out->push_back(static_cast<char>(0x80 | ((cp >> 6) & 0x3F)));
-    out->push_back(static_cast<char>(0x80 | (cp & 0x3F)));
-  } else {
-    out->push_back(static_cast<char>(0xF0 | (cp >> 18)));
-    out->push_back(static_cast<char>(0x80 | ((cp >> 12) & 0x3F)));
-    out->push_back(static_cast<char>(0x80 | ((cp >> 6) & 0x3F)));
-    out->push_back(static_cast<char>(0x80 | (cp & 0x3F)));
-  }
-}
 
 }  // namespace
 
@@ -85,24 +69,14 @@ bool DecodeCs0(const uint8_t *p, size_t len, std::string *out) {
   if (len == 0) return true;
   uint8_t comp = p[0];
   if (comp == 8 || comp == 254) {
-    for (size_t i = 1; i < len; i++) AppendUtf8(p[i], out);
+    for (size_t i = 1; i < len; i++) utf8::Append(p[i], out);
     return true;
   }
   if (comp != 16 && comp != 255) return false;
   // A trailing odd byte cannot be a character; it is dropped.
-  for (size_t i = 1; i + 1 < len; i += 2) {
-    uint32_t u = (static_cast<uint32_t>(p[i]) << 8) | p[i + 1];
-    if (u >= 0xD800 && u <= 0xDBFF && i + 3 < len) {
-      uint32_t lo = (static_cast<uint32_t>(p[i + 2]) << 8) | p[i + 3];
-      if (lo >= 0xDC00 && lo <= 0xDFFF) {
-        AppendUtf8(0x10000 + ((u - 0xD800) << 10) + (lo - 0xDC00), out);
-        i += 2;
-        continue;
-      }
-    }
-    if (u >= 0xD800 && u <= 0xDFFF) u = 0xFFFD;
-    AppendUtf8(u, out);
-  }
+  utf8::AppendUtf16(
+      (len - 1) / 2,
+      [p](size_t i) { return (static_cast<uint32_t>(p[1 + 2 * i]) << 8) | p[2 + 2 * i]; }, out);
   return true;
 }
 
