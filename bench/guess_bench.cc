@@ -47,6 +47,12 @@ BENCHMARK_CAPTURE(BM_GuessGuest, winxppro_4GiB, "winxppro-4g.iso", 0)
     ->Unit(benchmark::kMicrosecond);
 // Recognised by the second.
 BENCHMARK_CAPTURE(BM_GuessGuest, win98_4GiB, "win98-4g.iso", 0)->Unit(benchmark::kMicrosecond);
+// A UDF bridge medium, recognised by the third recogniser from its UDF tree.
+BENCHMARK_CAPTURE(BM_GuessGuest, win10_udf_4GiB, "win10-4g.iso", 0)
+    ->Unit(benchmark::kMicrosecond);
+// Recognised sixth, after every Windows and Red Hat probe has missed.
+BENCHMARK_CAPTURE(BM_GuessGuest, ubuntu_4GiB, "ubuntu-4g.iso", 0)
+    ->Unit(benchmark::kMicrosecond);
 // Known to no recogniser: the whole sequence runs.
 BENCHMARK_CAPTURE(BM_GuessGuest, unknown_4GiB, "unknown-4g.iso", 1)
     ->Unit(benchmark::kMicrosecond);
