@@ -1,4 +1,4 @@
-// FAT12/FAT16 volume layout (Microsoft FAT specification): the boot sector's
+// FAT12/FAT16 volume layout (as Microsoft documents the format): the boot sector's
 // BIOS parameter block gives the sector size, cluster size, reserved
 // sectors, number and size of the FATs and the root directory's entry count;
 // then come the FATs, the fixed root directory and the data clusters,
