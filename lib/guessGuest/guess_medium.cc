@@ -119,21 +119,16 @@ bool FindIso(GuessMedium *medium, GuessDir *dir, const char *name, bool wantData
   }
   bool ok = false;
   Iso9660File *file = nullptr;
-  if (found && !wantData && entry.isDirectory) {
+  if (found && !wantData) {
     // Some media mark themselves by a folder (an application bundle), so a
     // presence test counts directories; only their data cannot be read.
-    if (out_size != nullptr) *out_size = 0;
-    ok = true;
+    ok = entry.isDirectory || Iso9660_OpenFile(medium->isoImage, &entry, &file) == ISO9660_OK;
+    if (ok && out_size != nullptr) *out_size = 0;
   } else if (found && Iso9660_OpenFile(medium->isoImage, &entry, &file) == ISO9660_OK) {
-    if (!wantData) {
-      if (out_size != nullptr) *out_size = 0;
-      ok = true;
-    } else {
-      *out_data = ReadIsoFile(medium->isoImage, file, entry.size, out_size);
-      ok = *out_data != nullptr;
-    }
-    Iso9660_CloseFile(medium->isoImage, file);
+    *out_data = ReadIsoFile(medium->isoImage, file, entry.size, out_size);
+    ok = *out_data != nullptr;
   }
+  if (file != nullptr) Iso9660_CloseFile(medium->isoImage, file);
   Iso9660_CloseDir(medium->isoImage, scan);
   return ok;
 }
@@ -147,7 +142,6 @@ bool FindUdf(GuessMedium *medium, GuessDir *dir, const char *name, bool wantData
     UDFDir *sub = UDF_OpenDir(medium->udfVolume, dir->udfDir, name);
     if (sub == nullptr) return false;
     UDF_CloseDir(sub);
-    if (out_size != nullptr) *out_size = 0;
     return true;
   }
   bool ok = true;

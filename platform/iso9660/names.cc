@@ -22,7 +22,6 @@ constexpr uint32_t kModeTypeMask = 0170000;
 constexpr uint32_t kModeSymlink = 0120000;
 constexpr uint32_t kModeDirectory = 0040000;
 
-
 // Length of the valid UTF-8 sequence at s[i], or 0.
 size_t Utf8SeqLen(std::string_view s, size_t i) {
   auto b = [&](size_t k) { return static_cast<unsigned char>(s[k]); };

@@ -37,7 +37,6 @@ constexpr std::array<uint16_t, 256> MakeCrcTable() {
 
 constexpr std::array<uint16_t, 256> kCrcTable = MakeCrcTable();
 
-
 }  // namespace
 
 uint16_t Crc16(const uint8_t *data, size_t len) {
