@@ -8,7 +8,13 @@
 #include <string>
 #include <strings.h>
 
-#include "platform/raii.h"
+#include <curl/curl.h>
+
+#include "platform/unique.h"
+
+namespace tvx {
+TVX_MAKE_DELETER(CURL, curl_easy_cleanup);
+}  // namespace tvx
 
 struct HttpConnection {
   tvx::UniquePtr<CURL> curl;

@@ -2,7 +2,7 @@
 // the answers the user types for it.
 #include <cstring>
 
-#include "lib/guestInstall/autoinstall_int.h"
+#include "lib/guestInstall/autoinstall_internal.h"
 #include "platform/guestos.h"
 #include "platform/str.h"
 

@@ -2,7 +2,7 @@
 #include <cstring>
 #include <initializer_list>
 
-#include "lib/guestInstall/autoinstall_int.h"
+#include "lib/guestInstall/autoinstall_internal.h"
 #include "platform/log.h"
 #include "platform/msg.h"
 #include "platform/str.h"

@@ -5,7 +5,7 @@
 #include <string>
 #include <vector>
 
-#include "lib/guestInstall/autoinstall_int.h"
+#include "lib/guestInstall/autoinstall_internal.h"
 #include "tvx_autoinstall.h"
 
 namespace {

@@ -1,13 +1,13 @@
 // Fills the user's answers into a copy of the unattend template. The template
 // decides which settings exist; an element it lacks is simply not written, so
 // a host may ship a reduced template for a guest family.
-#include "lib/guestInstall/autoinstallGuestWindowsXml.h"
+#include "lib/guestInstall/autoinstall_windows_xml.h"
 
 #include <libxml/parser.h>
 
 #include <cstring>
 
-#include "platform/raii.h"
+#include "platform/xml_unique.h"
 
 namespace {
 

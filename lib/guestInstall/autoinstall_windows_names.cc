@@ -10,7 +10,7 @@
 #include <cstring>
 #include <string>
 
-#include "lib/guestInstall/autoinstall_int.h"
+#include "lib/guestInstall/autoinstall_internal.h"
 #include "platform/msg.h"
 #include "platform/str.h"
 #include "platform/util.h"

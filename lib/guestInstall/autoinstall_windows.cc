@@ -5,11 +5,11 @@
 #include <cstdlib>
 #include <cstring>
 
-#include "lib/guestInstall/autoinstallGuestWindowsXml.h"
+#include "lib/guestInstall/autoinstall_windows_xml.h"
 #include "platform/file.h"
 #include "platform/guestos.h"
 #include "platform/log.h"
-#include "platform/raii.h"
+#include "platform/unique.h"
 #include "platform/timeutil.h"
 #include "platform/unicode.h"
 #include "platform/util.h"

@@ -10,8 +10,8 @@
 #include <cstdlib>
 #include <vector>
 
-#include "lib/guestInstall/autoinstallGuestWindowsXml.h"
-#include "platform/raii.h"
+#include "lib/guestInstall/autoinstall_windows_xml.h"
+#include "platform/xml_unique.h"
 #include "platform/str.h"
 
 namespace {

@@ -1,4 +1,4 @@
-#include "lib/guestInstall/autoinstallGuestWindowsXml.h"
+#include "lib/guestInstall/autoinstall_windows_xml.h"
 
 #include <gtest/gtest.h>
 #include <libxml/parser.h>
@@ -6,7 +6,7 @@
 #include <string>
 
 #include "support/unattend_xml.h"
-#include "platform/raii.h"
+#include "platform/xml_unique.h"
 #include "support/log_capture.h"
 
 namespace {
