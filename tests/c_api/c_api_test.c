@@ -94,6 +94,9 @@ static void TestFloppy(void) {
   remove(host);
   CHECK(GetFileFromFloppyImg(root, "WINNT.SIF", host));
   CHECK(!GetFileFromFloppyImg(root, "absent", host));
+  CHECK(!AutoInstall_MakeFloppyImg(NULL, "/tmp", NULL, NULL, NULL, NULL));
+  CHECK(!AutoInstall_AddFileToFloppyImg(host, "x.txt", "/nonexistent/tvx-config"));
+  WriteOEMDriverInfo("/nonexistent/txtsetup.oem", "/nonexistent/winnt.sif");
   CHECK(FAT_CloseDirectory(root) == FAT_OK);
   CHECK(FAT_CloseVolume(vol) == FAT_OK);
   f = fopen(host, "r");
