@@ -130,6 +130,9 @@ TEST_F(WindowsFloppy, DriverSourcesAndBaseFloppy) {
     std::string sif = FloppyFile("winnt.sif");
     EXPECT_EQ(sif.find("[OEMBootFiles]\nsymmpi.sys\ntxtsetup.oem\n") != std::string::npos, c.oem) << c.label;
     EXPECT_EQ(sif.find(kEntry) != std::string::npos, c.oem) << c.label;
+    if (c.oem) {
+      EXPECT_TRUE(FloppyFile("symmpi.sys") == Bytes(40000, 2)) << c.label;
+    }
     EXPECT_EQ(Listing(cfg_), std::set<std::string>{"autoinst.flp"}) << c.label;
   }
   // The caller's driver folder is left as it was.
