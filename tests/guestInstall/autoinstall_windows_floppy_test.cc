@@ -78,12 +78,19 @@ class WindowsFloppy : public ::testing::Test {
 };
 
 TEST_F(WindowsFloppy, DriversFromTheToolsIsoWithUpgrader) {
+  std::string extra = t_.Join("extra.txt");
+  WriteFileOrDie(extra, Bytes(600, 4));
+  EXPECT_FALSE(AutoInstall_AddFileToFloppyImg(extra.c_str(), "extra.txt", cfg_.c_str()));
+  EXPECT_FALSE(fs::exists(flp_));  // adding never creates the image
   ASSERT_TRUE(AutoInstall_MakeFloppyImg(nullptr, cfg_.c_str(), iso_.c_str(), "/drivers/scsi",
                                         "upgrader", res_.c_str()));
+  EXPECT_TRUE(AutoInstall_AddFileToFloppyImg(extra.c_str(), "Extra File.txt", cfg_.c_str()));
   EXPECT_EQ(FatProblems(flp_), "");
   EXPECT_EQ(MtoolsNames(flp_),
             (std::set<std::string>{"winnt.sif", "autoun~0.xml", "storePwd.ini", "storePwd.exe",
-                                   "upgrader.exe", "unattend.cmd", "symmpi.sys", "txtsetup.oem"}));
+                                   "upgrader.exe", "unattend.cmd", "symmpi.sys", "txtsetup.oem",
+                                   "Extra File.txt"}));
+  EXPECT_TRUE(FloppyFile("Extra File.txt") == Bytes(600, 4));
   EXPECT_EQ(FloppyFile("winnt.sif"),
             kSif + "[OEMBootFiles]\nsymmpi.sys\ntxtsetup.oem\n[MassStorageDrivers]\n" + kEntry);
   EXPECT_TRUE(FloppyFile("upgrader.exe") == Bytes(70000, 3));
@@ -207,17 +214,6 @@ TEST_F(WindowsFloppy, OemDriverEntry) {
     EXPECT_EQ(log.All(), c.warns ? "WriteOEMDriverInfo: Failed to detect the type of driver in " + oem + "\n" : "")
         << c.label;
   }
-}
-
-TEST_F(WindowsFloppy, AddingLaterNeedsTheImage) {
-  std::string extra = t_.Join("extra.txt");
-  WriteFileOrDie(extra, Bytes(600, 4));
-  EXPECT_FALSE(AutoInstall_AddFileToFloppyImg(extra.c_str(), "extra.txt", cfg_.c_str()));
-  EXPECT_FALSE(fs::exists(flp_));
-  ASSERT_TRUE(AutoInstall_MakeFloppyImg(nullptr, cfg_.c_str(), nullptr, nullptr, nullptr, res_.c_str()));
-  EXPECT_TRUE(AutoInstall_AddFileToFloppyImg(extra.c_str(), "Extra File.txt", cfg_.c_str()));
-  EXPECT_EQ(FatProblems(flp_), "");
-  EXPECT_TRUE(FloppyFile("Extra File.txt") == Bytes(600, 4));
 }
 
 }  // namespace
