@@ -28,14 +28,4 @@ TEST(GuessSolaris, OverrideIsTheOsKey) {
   EXPECT_STREQ(Guess_GetOsKey(&r), "solaris10-64");
 }
 
-TEST(GuessNetWare, FirstListedReleaseDirectory) {
-  const GuessRow rows[] = {
-      {"netware/nw65", "netware6"},
-      {"netware/nw6-upper", "netware6"},
-      {"netware/nw51-first", "netware5"},
-      {"netware/nw-none", nullptr},
-  };
-  for (const GuessRow &row : rows) ExpectGuess(row);
-}
-
 }  // namespace

@@ -45,8 +45,7 @@ TEST(GuessMandriva, ProductId) {
   const GuessRow rows[] = {
       {"mandriva/pid2008.0", "mandriva", GUESS_VERSION_MANDRIVA_2008_0, kIso, "2008.0"},
       {"mandriva/pid2007.1", "mandriva-64", GUESS_VERSION_MANDRIVA_2007, kNoIso, "2007.1"},
-      {"mandriva/pid2009.1", "mandriva", GUESS_VERSION_MANDRIVA_2008_1_OR_HIGHER, kNoIso,
-       "2009.1"},
+      {"mandriva/pid2009.1", "mandriva", GUESS_VERSION_MANDRIVA_2008_1_OR_HIGHER, kNoIso, "2009.1"},
       {"mandriva/pid2006.0", "mandriva", 0, kNoIso, "2006.0"},
       {"mandriva/pid-noversion", "mandriva-64", 0, kNoIso},
       {"mandriva/pid-lastfield", "mandriva", 0, kNoIso},
@@ -70,10 +69,8 @@ TEST(GuessTurboLinux, ReadmeFirstWord) {
 
 TEST(GuessLumen, PackageDirectories) {
   const GuessRow rows[] = {
-      {"mandriva/lumen-64", "tarvex-lumen-64"},
-      {"mandriva/lumen-arm", "arm-tarvex-lumen-64"},
-      {"mandriva/lumen-both", nullptr},
-      {"mandriva/lumen-none", nullptr},
+      {"mandriva/lumen-64", "tarvex-lumen-64"}, {"mandriva/lumen-arm", "arm-tarvex-lumen-64"},
+      {"mandriva/lumen-both", nullptr},         {"mandriva/lumen-none", nullptr},
       {"mandriva/lumen-nomarker", nullptr},
   };
   for (const GuessRow &row : rows) ExpectGuess(row);

@@ -28,12 +28,9 @@ TEST(GuessOrka, PackagesXml) {
 // Entities are never substituted and nothing outside the medium is read.
 TEST(GuessOrka, HostileXml) {
   const GuessRow rows[] = {
-      {"orka/orka-entity", nullptr},
-      {"orka/orka-external", nullptr},
-      {"orka/orka-laughs", nullptr},
-      {"orka/orka-truncated", nullptr},
-      {"orka/orka-binary", nullptr},
-      {"orka/orka-empty", nullptr},
+      {"orka/orka-entity", nullptr}, {"orka/orka-external", nullptr},
+      {"orka/orka-laughs", nullptr}, {"orka/orka-truncated", nullptr},
+      {"orka/orka-binary", nullptr}, {"orka/orka-empty", nullptr},
   };
   for (const GuessRow &row : rows) ExpectGuess(row);
 }

@@ -39,4 +39,14 @@ TEST(GuessFreeBSD, UnusableKernel) {
   for (const GuessRow &row : rows) ExpectGuess(row);
 }
 
+TEST(GuessNetWare, FirstListedReleaseDirectory) {
+  const GuessRow rows[] = {
+      {"netware/nw65", "netware6"},
+      {"netware/nw6-upper", "netware6"},
+      {"netware/nw51-first", "netware5"},
+      {"netware/nw-none", nullptr},
+  };
+  for (const GuessRow &row : rows) ExpectGuess(row);
+}
+
 }  // namespace

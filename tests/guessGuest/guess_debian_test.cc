@@ -42,8 +42,7 @@ TEST(GuessDebian, UbuntuDesktopClasses) {
       {"debian/ubu-1410", "ubuntu-64", GUESS_VERSION_UBUNTU_1410, kIso, "14.10"},
       {"debian/ubu-1504", "ubuntu", GUESS_VERSION_UBUNTU_1504_TO_2004, kIso, "15.04"},
       {"debian/ubu-2004", "ubuntu-64", GUESS_VERSION_UBUNTU_1504_TO_2004, kIso, "20.04.1"},
-      {"debian/ubu-2004-noiso", "ubuntu-64", GUESS_VERSION_UBUNTU_1504_TO_2004, kNoIso,
-       "20.04.1"},
+      {"debian/ubu-2004-noiso", "ubuntu-64", GUESS_VERSION_UBUNTU_1504_TO_2004, kNoIso, "20.04.1"},
       // From 20.10 on the isolinux probe is overruled.
       {"debian/ubu-2010", "ubuntu-64", GUESS_VERSION_UBUNTU_2010_OR_HIGHER, kIso, "20.10"},
       {"debian/ubu-2204-arm", "arm-ubuntu-64", GUESS_VERSION_UBUNTU_2010_OR_HIGHER, kIso,
@@ -90,8 +89,8 @@ TEST(GuessDebian, DamagedInfoFiles) {
 }
 
 TEST(GuessDebian, UdfBridgeImage) {
-  ExpectGuess({"debian/ubu-2004-udf", "ubuntu-64", GUESS_VERSION_UBUNTU_1504_TO_2004, kIso,
-               "20.04.1"});
+  ExpectGuess(
+      {"debian/ubu-2004-udf", "ubuntu-64", GUESS_VERSION_UBUNTU_1504_TO_2004, kIso, "20.04.1"});
 }
 
 }  // namespace
