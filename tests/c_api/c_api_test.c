@@ -11,6 +11,7 @@
 #include <stdio.h>
 #include <stdlib.h>
 #include <string.h>
+#include <unistd.h>
 
 static int failures = 0;
 static const char *phase = "";
@@ -71,6 +72,28 @@ static void TestIni(void) {
   CHECK(!IniUtil_GetIniFileString(path, "Data", "AutoPartition", NULL, 8));
   remove(path);
   CHECK(!IniUtil_WriteIniFileString(path, "S", "K", "v", FALSE));
+}
+
+/* A fresh floppy: the transfer calls and the Windows floppy calls. */
+static void TestFloppy(void) {
+  char path[] = "/tmp/tvx_c_api_flp_XXXXXX";
+  FATVolume *vol = NULL;
+  FATDirectory *root = NULL;
+  int fd = mkstemp(path);
+  phase = "floppy";
+  CHECK(fd >= 0);
+  if (fd < 0) return;
+  close(fd);
+  CHECK(FAT_FormatVolume(FATDevFileIO_Open(path), FAT_FLOPPY_SIZE, 0, &vol) == FAT_OK);
+  CHECK(FAT_OpenRootDirectory(vol, &root) == FAT_OK);
+  CHECK(AddFileToFloppyImg(root, "/dev/null", "empty.txt"));
+  CHECK(GetFileFromFloppyImg(root, "EMPTY.TXT", "/dev/null"));
+  CHECK(!GetFileFromFloppyImg(root, "absent", "/dev/null"));
+  CHECK(FAT_CloseDirectory(root) == FAT_OK && FAT_CloseVolume(vol) == FAT_OK);
+  CHECK(!AutoInstall_MakeFloppyImg(NULL, "/tmp", NULL, NULL, NULL, NULL));
+  CHECK(!AutoInstall_AddFileToFloppyImg(path, "x.txt", "/nonexistent/tvx-config"));
+  WriteOEMDriverInfo("/nonexistent/txtsetup.oem", "/nonexistent/winnt.sif");
+  remove(path);
 }
 
 /* Support, limits and validation for a hand-made recognition result. */
@@ -182,6 +205,7 @@ int main(void) {
   TestAutoInstall();
   TestWindowsAnswers();
   TestSignature();
+  TestFloppy();
   if (failures == 0) printf("c_api: all phases passed\n");
   return failures == 0 ? 0 : 1;
 }
