@@ -46,18 +46,18 @@ struct Verified {
 
 // Open opens IMAGE or URL with hash data required; the result code of the
 // open call (TOOLSISO_OPEN_*).
-int Open(const std::string &where, Verified *v) {
+int Open(const std::string &where, const char *cert, Verified *v) {
   int rc;
   if (IsUrl(where)) {
     ToolsIsoRemoteFile *h = nullptr;
-    rc = ToolsISO_RemoteFileOpen(where.c_str(), TRUE, &h);
+    rc = ToolsISO_RemoteFileOpenEx(where.c_str(), TRUE, cert, &h);
     v->handle = h;
     v->read = ToolsISO_RemoteFileReadCB;
     v->isoRead = ToolsISO_RemoteFileIsoReadCB;
     v->close = ToolsISO_RemoteFileCloseCB;
   } else {
     ToolsIsoLocalFile *h = nullptr;
-    rc = ToolsISO_LocalFileOpen(where.c_str(), TRUE, &h);
+    rc = ToolsISO_LocalFileOpenEx(where.c_str(), TRUE, cert, &h);
     v->handle = h;
     v->read = ToolsISO_LocalFileReadCB;
     v->isoRead = ToolsISO_LocalFileIsoReadCB;
@@ -70,9 +70,9 @@ int Open(const std::string &where, Verified *v) {
 // OpenOrExplain opens and, on failure, says why on standard error; returns
 // the command's exit status for a failure (2 cannot read, 3 hash data or
 // signature), or 0.
-int OpenOrExplain(const std::string &where, Verified *v) {
+int OpenOrExplain(const std::string &where, const std::string &cert, Verified *v) {
   LogLines log;
-  int rc = Open(where, v);
+  int rc = Open(where, cert.empty() ? nullptr : cert.c_str(), v);
   if (rc == TOOLSISO_OPEN_OK) return 0;
   std::fprintf(stderr, "tvxguest: %s: %s\n", where.c_str(),
                rc == TOOLSISO_OPEN_IO_ERROR ? "cannot open the image"
@@ -82,7 +82,7 @@ int OpenOrExplain(const std::string &where, Verified *v) {
 }
 
 constexpr const char *kVerifyUsage =
-    "Usage: tvxguest tools verify [--json] [--quiet] IMAGE|URL\n\n"
+    "Usage: tvxguest tools verify [--json] [--quiet] [--cert FILE] IMAGE|URL\n\n"
     "Checks a guest-tools ISO image against its signed hash data: IMAGE.sha with its\n"
     "embedded signature or IMAGE.sig beside a local image, or the same companions\n"
     "of an http(s) URL (\".sha\"/\".sig\" inserted after \".iso\"). Every block of the\n"
@@ -92,6 +92,7 @@ constexpr const char *kVerifyUsage =
     "              \"blocks\", \"signature\", \"badBlocks\", \"firstBadBlock\",\n"
     "              \"firstBadOffset\", \"verified\"}\n"
     "  --quiet     no progress bar\n"
+    "  --cert FILE trust the maker certificates in FILE instead of the installed ones\n"
     "  -h, --help  show this help\n\n"
     "Exit status: 0 every block verified, 1 bad blocks, 2 the image cannot be read,\n"
     "3 hash data missing or invalid or its signature bad, 64 usage error.\n";
@@ -136,8 +137,10 @@ Scan VerifyAll(Verified &v, bool quiet) {
 
 int Verify(const std::vector<std::string> &args) {
   bool json = false, quiet = false;
+  std::string cert;
   std::vector<std::string> pos;
-  for (const std::string &a : args) {
+  for (size_t i = 0; i < args.size(); i++) {
+    const std::string &a = args[i];
     if (IsHelp(a)) {
       std::fputs(kVerifyUsage, stdout);
       return 0;
@@ -145,6 +148,8 @@ int Verify(const std::vector<std::string> &args) {
       json = true;
     } else if (a == "--quiet") {
       quiet = true;
+    } else if (a == "--cert" && i + 1 < args.size()) {
+      cert = args[++i];
     } else if (a.size() > 1 && a[0] == '-') {
       return UsageError("tools verify", "unknown option '" + a + "'");
     } else {
@@ -153,7 +158,7 @@ int Verify(const std::vector<std::string> &args) {
   }
   if (pos.size() != 1) return UsageError("tools verify", "one IMAGE or URL is needed");
   Verified v;
-  if (int rc = OpenOrExplain(pos[0], &v)) return rc;
+  if (int rc = OpenOrExplain(pos[0], cert, &v)) return rc;
   Scan s = VerifyAll(v, quiet || json);
   const ToolsIsoImageInfo &i = v.info;
   uint64_t blocks = (i.imageSize + i.blockSize - 1) / i.blockSize;
@@ -187,19 +192,24 @@ int Verify(const std::vector<std::string> &args) {
 }
 
 constexpr const char *kCatUsage =
-    "Usage: tvxguest tools cat IMAGE|URL PATH\n\n"
+    "Usage: tvxguest tools cat [--cert FILE] IMAGE|URL PATH\n\n"
     "Writes the file PATH inside a guest-tools ISO image to standard output, byte\n"
     "for byte, reading the image through its signed hash data (as 'tools verify'\n"
-    "finds it): any bad block the file touches fails the command.\n\n"
+    "finds it): any bad block the file touches fails the command. --cert FILE trusts\n"
+    "the maker certificates in FILE instead of the installed ones.\n\n"
     "Exit status: 0 success, 1 no such file or a bad block, 2 the image cannot be\n"
     "read, 3 hash data missing or invalid or its signature bad, 64 usage error.\n";
 
 int Cat(const std::vector<std::string> &args) {
+  std::string cert;
   std::vector<std::string> pos;
-  for (const std::string &a : args) {
+  for (size_t i = 0; i < args.size(); i++) {
+    const std::string &a = args[i];
     if (IsHelp(a)) {
       std::fputs(kCatUsage, stdout);
       return 0;
+    } else if (a == "--cert" && i + 1 < args.size()) {
+      cert = args[++i];
     } else if (a.size() > 1 && a[0] == '-') {
       return UsageError("tools cat", "unknown option '" + a + "'");
     } else {
@@ -208,7 +218,7 @@ int Cat(const std::vector<std::string> &args) {
   }
   if (pos.size() != 2) return UsageError("tools cat", "IMAGE and PATH are needed");
   Verified v;
-  if (int rc = OpenOrExplain(pos[0], &v)) return rc;
+  if (int rc = OpenOrExplain(pos[0], cert, &v)) return rc;
   LogLines log;
   Iso9660Image *image = nullptr;
   int rc = Iso9660_OpenWithReader(v.isoRead, v.close, v.handle, 0, &image);

@@ -73,6 +73,8 @@ check "without a map the table decides" 0 $? "$out" "chosen by: table"
 
 out=$("$tool" tools verify "$iso/windows.iso")
 check "verify a detached signature" 0 $? "$out" "signature:  detached, valid"
+out=$("$tool" tools verify --cert "$certs/tvxpartner.cert" "$iso/windows.iso" 2>&1)
+check "another certificate named with --cert is the only trust" 3 $? "$out" "Signature verification failed"
 out=$("$tool" tools cat "$iso/linux.iso" bin/payload | cmp - "$work/tree/lin/bin/payload" 2>&1)
 check "cat a file byte-exact" 0 $? "$out"
 
