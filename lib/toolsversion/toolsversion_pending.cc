@@ -1,0 +1,28 @@
+// Stand-ins for the tools-image calls until those layers are merged: every
+// one fails, so the status falls back as it does without a tools image.
+#include "lib/toolsversion/toolsversion_pending.h"
+
+extern "C" {
+__attribute__((weak)) Bool ToolsISO_GetImagePath(const char *, const char *, const char *, Bool,
+                                                 char **imagePath, char **imageBaseName,
+                                                 uint32_t *isoOpenMode) {
+  if (imagePath != nullptr) *imagePath = nullptr;
+  if (imageBaseName != nullptr) *imageBaseName = nullptr;
+  if (isoOpenMode != nullptr) *isoOpenMode = 0;
+  return FALSE;
+}
+__attribute__((weak)) char *ToolsISO_GetRealPath(const char *) { return nullptr; }
+__attribute__((weak)) Bool ToolsISO_ReadFile(const char *, char **, size_t *) { return FALSE; }
+__attribute__((weak)) Bool ToolsISO_VerifySignature(const char *, const void *, size_t,
+                                                    const void *, size_t) {
+  return FALSE;
+}
+__attribute__((weak)) int ToolsISO_LocalFileOpen(const char *, Bool, ToolsIsoLocalFile **h) {
+  *h = nullptr;
+  return 1;
+}
+__attribute__((weak)) Bool ToolsISO_LocalFileIsoReadCB(void *, void *, size_t, uint64_t) {
+  return FALSE;
+}
+__attribute__((weak)) Bool ToolsISO_LocalFileCloseCB(void *) { return FALSE; }
+}
