@@ -141,21 +141,24 @@ uint32_t EvaluateManifests(const char *hostPath, const char *avrPath, const Dict
   LogSwitches switches;
   TablePtr table = LoadManifests(hostPath, avrPath, guest, &switches);
   if (table == nullptr) return TOOLS_STATUS_UNKNOWN;
+  return EvaluateTable(table.get(), switches, report);
+}
 
+uint32_t EvaluateTable(HashTable *table, const LogSwitches &switches, Report *report) {
   ComponentInfo mono;
   void *data = nullptr;
-  if (HashTable_Remove(table.get(), "monolithic", &data)) {
+  if (HashTable_Remove(table, "monolithic", &data)) {
     std::unique_ptr<ComponentInfo> owned(static_cast<ComponentInfo *>(data));
     mono = *owned;
   }
-  if (HashTable_Remove(table.get(), "legacy", &data)) {
+  if (HashTable_Remove(table, "legacy", &data)) {
     std::unique_ptr<ComponentInfo> legacy(static_cast<ComponentInfo *>(data));
     if (!IsSet(mono.versionOnHost)) mono.versionOnHost = legacy->versionOnHost;
     if (!IsSet(mono.versionInGuest)) mono.versionInGuest = legacy->versionInGuest;
     if (!IsSet(mono.avrMin)) mono.avrMin = legacy->avrMin;
   }
   if (!IsSet(mono.versionInGuest)) {
-    if (ComponentInfo *upgrader = LookupComponent(table.get(), "upgrader")) {
+    if (ComponentInfo *upgrader = LookupComponent(table, "upgrader")) {
       mono.versionInGuest = upgrader->versionInGuest;
     }
   }
@@ -164,7 +167,7 @@ uint32_t EvaluateManifests(const char *hostPath, const char *avrPath, const Dict
   const ToolsComponentStatus m = mono.status;
 
   Collected all;
-  HashTable_ForEach(table.get(), RateAndCollect, &all);
+  HashTable_ForEach(table, RateAndCollect, &all);
   ComponentRow monoRow = MakeRow("monolithic", mono);
   if (report != nullptr) {
     report->evaluated = true;

@@ -69,6 +69,10 @@ ComponentInfo *LookupComponent(HashTable *table, const char *name);
 // and AVR manifests only; faults are logged only then.
 void HandleEntry(HashTable *table, ToolsManifestKind kind, LogSwitches *switches,
                  const char *name, const char *value);
+// FillTable walks the loaded manifests into a new table: host, then AVR
+// (or, without one, the host versions as minimums), then the guest.
+TablePtr FillTable(const Dictionary *host, const Dictionary *avr, const Dictionary *guest,
+                   LogSwitches *switches);
 // LoadManifests fills a new table from the host manifest file, the AVR
 // manifest (optional path; checked against its ".sig") and the guest
 // dictionary (optional). Null when the host manifest cannot be loaded.
@@ -97,6 +101,9 @@ struct Report {
 
 const char *ComponentStatusText(uint32_t rating);
 ToolsComponentStatus RateComponent(const ComponentInfo &c);
+// EvaluateTable rates the components of a filled table and combines the
+// ratings: a status of {1..6, 9}. `report` is optional.
+uint32_t EvaluateTable(HashTable *table, const LogSwitches &switches, Report *report);
 // EvaluateManifests rates the components of the three manifests and
 // combines the ratings: a status of {1..6, 9}. `report` is optional.
 uint32_t EvaluateManifests(const char *hostPath, const char *avrPath, const Dictionary *guest,

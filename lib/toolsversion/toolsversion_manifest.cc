@@ -227,9 +227,22 @@ int CopyHostAsMinimum(const void *, void *data, void *) {
 
 }  // namespace
 
+TablePtr FillTable(const Dictionary *host, const Dictionary *avr, const Dictionary *guest,
+                   LogSwitches *switches) {
+  TablePtr table = NewComponentTable();
+  WalkManifest(host, table.get(), MANIFEST_HOST, switches);
+  if (avr != nullptr) {
+    WalkManifest(avr, table.get(), MANIFEST_AVR, switches);
+  } else {
+    // Before the guest is read, so only the host's components get a minimum.
+    HashTable_ForEach(table.get(), CopyHostAsMinimum, nullptr);
+  }
+  if (guest != nullptr) WalkManifest(guest, table.get(), MANIFEST_GUEST, nullptr);
+  return table;
+}
+
 TablePtr LoadManifests(const char *hostPath, const char *avrPath, const Dictionary *guest,
                        LogSwitches *switches) {
-  TablePtr table = NewComponentTable();
   DictPtr host(Dictionary_Create());
   MsgList *rawMessages = nullptr;
   Bool loaded = Dictionary_LoadEx(host.get(), hostPath, &rawMessages);
@@ -239,21 +252,12 @@ TablePtr LoadManifests(const char *hostPath, const char *avrPath, const Dictiona
     TV_LOG("Error loading dictionary from host manifest: '%s': %s.\n", hostPath, text.get());
     return nullptr;
   }
-  WalkManifest(host.get(), table.get(), MANIFEST_HOST, switches);
-
   DictPtr avr;
   if (avrPath != nullptr) {
     avr = LoadAvr(avrPath);
     if (avr == nullptr) TV_LOG("AVR file corrupted, ignoring AVR values\n");
   }
-  if (avr != nullptr) {
-    WalkManifest(avr.get(), table.get(), MANIFEST_AVR, switches);
-  } else {
-    // Before the guest is read, so only the host's components get a minimum.
-    HashTable_ForEach(table.get(), CopyHostAsMinimum, nullptr);
-  }
-  if (guest != nullptr) WalkManifest(guest, table.get(), MANIFEST_GUEST, nullptr);
-  return table;
+  return FillTable(host.get(), avr.get(), guest, switches);
 }
 
 }  // namespace tvx::toolsversion

@@ -2,6 +2,15 @@
 // one fails, so the status falls back as it does without a tools image.
 #include "lib/toolsversion/toolsversion_pending.h"
 
+#include <fcntl.h>
+
+#include <cstdlib>
+#include <cstring>
+#include <string>
+
+#include "platform/fd_io.h"
+#include "platform/unique.h"
+
 extern "C" {
 __attribute__((weak)) Bool ToolsISO_GetImagePath(const char *, const char *, const char *, Bool,
                                                  char **imagePath, char **imageBaseName,
@@ -11,11 +20,15 @@ __attribute__((weak)) Bool ToolsISO_GetImagePath(const char *, const char *, con
   if (isoOpenMode != nullptr) *isoOpenMode = 0;
   return FALSE;
 }
-__attribute__((weak)) char *ToolsISO_GetRealPath(const char *) { return nullptr; }
-__attribute__((weak)) Bool ToolsISO_ReadFile(const char *, char **, size_t *) { return FALSE; }
-__attribute__((weak)) Bool ToolsISO_VerifySignature(const char *, const void *, size_t,
-                                                    const void *, size_t) {
-  return FALSE;
+__attribute__((weak)) char *ToolsISO_GetRealPath(const char *path) { return realpath(path, nullptr); }
+__attribute__((weak)) Bool ToolsISO_ReadFile(const char *path, char **out, size_t *size) {
+  std::string text;
+  tvx::UniqueFd fd(open(path, O_RDONLY | O_CLOEXEC));
+  if (!fd || !tvx::ReadAllLimited(fd.get(), 1 << 28, &text)) return FALSE;
+  *out = static_cast<char *>(malloc(text.size() + 1));
+  memcpy(*out, text.c_str(), text.size() + 1);
+  *size = text.size();
+  return TRUE;
 }
 __attribute__((weak)) int ToolsISO_LocalFileOpen(const char *, Bool, ToolsIsoLocalFile **h) {
   *h = nullptr;
