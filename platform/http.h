@@ -7,6 +7,8 @@
 #include <cstddef>
 #include <cstdint>
 
+#include "platform/unique.h"
+
 struct HttpConnection;
 
 enum HttpError {
@@ -49,3 +51,7 @@ HttpError Http_Read(HttpConnection *conn, const char *url, uint64_t offset, void
 HttpError Http_Close(HttpConnection *conn);
 // Http_ErrorString describes a result (constant text).
 const char *Http_ErrorString(HttpError error);
+
+namespace tvx {
+TVX_MAKE_DELETER(HttpConnection, Http_Close);
+}  // namespace tvx
