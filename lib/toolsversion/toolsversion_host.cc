@@ -3,7 +3,8 @@
 // manifest from an image whose hash data or signature fails is never used),
 // and the signed AVR manifest beside the image.
 #include "lib/toolsversion/toolsversion_internal.h"
-#include "lib/toolsversion/toolsversion_pending.h"
+#include "tvx_toolsiso.h"
+#include "tvx_toolsiso_image.h"
 #include "platform/file.h"
 #include "platform/str.h"
 #include "platform/vthread.h"

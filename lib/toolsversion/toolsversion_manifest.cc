@@ -5,7 +5,8 @@
 #include <cstring>
 
 #include "lib/toolsversion/toolsversion_internal.h"
-#include "lib/toolsversion/toolsversion_pending.h"
+#include "tvx_toolsiso.h"
+#include "tvx_toolsiso_image.h"
 #include "platform/ascii.h"
 #include "platform/msglist.h"
 #include "platform/str.h"
