@@ -166,16 +166,8 @@ DictPtr SavedManifest(const xmlNode *manifest) {
 
 }  // namespace
 
-SavedGuestInfo ReadSavedGuestInfo(const char *configPath, const Dictionary *config) {
+SavedGuestInfo SavedGuestInfoFromRoot(const xmlNode *root) {
   SavedGuestInfo info;
-  std::string path = ExtendedConfigPath(configPath, config);
-  if (path.empty()) {
-    TV_LOG("Error getting extended config file path.\n");
-    return info;
-  }
-  xmlNode *root = nullptr;
-  UniquePtr<xmlDoc> doc = LoadExtendedConfig(path, &root);
-  if (doc == nullptr) return info;
   if (FirstElement(root) == nullptr) {
     TV_LOG("Failed to find manifest content in extended config xml.\n");
     return info;
@@ -192,6 +184,18 @@ SavedGuestInfo ReadSavedGuestInfo(const char *configPath, const Dictionary *conf
   }
   info.manifest = SavedManifest(manifest);
   return info;
+}
+
+SavedGuestInfo ReadSavedGuestInfo(const char *configPath, const Dictionary *config) {
+  std::string path = ExtendedConfigPath(configPath, config);
+  if (path.empty()) {
+    TV_LOG("Error getting extended config file path.\n");
+    return {};
+  }
+  xmlNode *root = nullptr;
+  UniquePtr<xmlDoc> doc = LoadExtendedConfig(path, &root);
+  if (doc == nullptr) return {};
+  return SavedGuestInfoFromRoot(root);
 }
 
 }  // namespace tvx::toolsversion

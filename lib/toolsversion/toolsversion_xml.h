@@ -17,6 +17,10 @@ UniquePtr<xmlDoc> ParseXml(const char *text, size_t length);
 // null (logged) on failure.
 UniquePtr<xmlDoc> LoadExtendedConfig(const std::string &path, xmlNode **out_root);
 
+// SavedGuestInfoFromRoot reads the saved status, else the saved manifest,
+// from the root element of an extended config document.
+SavedGuestInfo SavedGuestInfoFromRoot(const xmlNode *root);
+
 // Element names compare without regard to case.
 bool NameIs(const xmlNode *node, const char *name);
 xmlNode *FirstElement(const xmlNode *parent);
