@@ -24,6 +24,45 @@ bool Attempt(PKCS7 *p7, STACK_OF(X509) * certs, X509_STORE *store, BIO *data, BI
   return PKCS7_verify(p7, certs, store, data, out, flags) > 0;
 }
 
+// The verification callback overwrites the chain error it is shown (with
+// "ok" below depth 5), so the reason a chain was refused is lost by the time
+// PKCS7_verify reports it. The maker's store therefore carries a note, in
+// its ex_data slot, of the first chain error that the callback rejected.
+struct ChainRefusal {
+  int code = X509_V_OK;
+};
+
+int RefusalIndex() {
+  static const int index = X509_STORE_get_ex_new_index(0, nullptr, nullptr, nullptr, nullptr);
+  return index;
+}
+
+int NotingCallback(int ok, X509_STORE_CTX *ctx) {
+  int code = X509_STORE_CTX_get_error(ctx);
+  int verdict = VerifyCallback(ok, ctx);
+  auto *note = static_cast<ChainRefusal *>(
+      X509_STORE_get_ex_data(X509_STORE_CTX_get0_store(ctx), RefusalIndex()));
+  if (verdict == 0 && note != nullptr && note->code == X509_V_OK) note->code = code;
+  return verdict;
+}
+
+// NoteOn attaches a note to a store for one check and takes it off again,
+// so a caller's store never keeps a pointer into a finished call.
+class NoteOn {
+ public:
+  NoteOn(X509_STORE *store, ChainRefusal *note) : store_(store) {
+    if (RefusalIndex() >= 0) X509_STORE_set_ex_data(store_, RefusalIndex(), note);
+  }
+  ~NoteOn() {
+    if (RefusalIndex() >= 0) X509_STORE_set_ex_data(store_, RefusalIndex(), nullptr);
+  }
+  NoteOn(const NoteOn &) = delete;
+  NoteOn &operator=(const NoteOn &) = delete;
+
+ private:
+  X509_STORE *store_;
+};
+
 // LastErrorText describes the newest error on OpenSSL's queue, with the
 // detail text that PKCS7_verify attaches ("Verify error:...").
 std::string LastErrorText() {
@@ -60,8 +99,10 @@ uint32_t Verify(PKCS7 *p7, BIO *data, X509_STORE *store, const TrustFiles &files
       !LoadCrl(partner.get(), files.partnerCrl.c_str(), err)) {
     return ZELSIGN_ERROR;
   }
-  X509_STORE_set_verify_cb(maker, VerifyCallback);
+  X509_STORE_set_verify_cb(maker, NotingCallback);
   X509_STORE_set_verify_cb(partner.get(), VerifyCallback);
+  ChainRefusal note;
+  NoteOn noted(maker, &note);
 
   STACK_OF(PKCS7_SIGNER_INFO) *infos = PKCS7_get_signer_info(p7);
   int count = infos != nullptr ? sk_PKCS7_SIGNER_INFO_num(infos) : 0;
@@ -80,7 +121,12 @@ uint32_t Verify(PKCS7 *p7, BIO *data, X509_STORE *store, const TrustFiles &files
       return ZELSIGN_ERROR;
     }
     if (Attempt(p7, certs.get(), maker, data, out.get(), PKCS7_BINARY)) return ZELSIGN_TRX_SIGNED;
-    if (makerRefusal != nullptr && makerRefusal->empty()) *makerRefusal = LastErrorText();
+    if (makerRefusal != nullptr && makerRefusal->empty()) {
+      *makerRefusal = note.code == X509_V_OK ? LastErrorText()
+                                             : std::string(ReasonText(ERR_peek_last_error())) +
+                                                   " (" + X509_verify_cert_error_string(note.code) +
+                                                   ")";
+    }
     if (Attempt(p7, certs.get(), partner.get(), data, out.get(), PKCS7_BINARY)) {
       return ZELSIGN_PARTNER_SIGNED;
     }
