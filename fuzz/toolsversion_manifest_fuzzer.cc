@@ -6,6 +6,8 @@
 #include <cstdlib>
 #include <string>
 
+#include "fuzz/split_input.h"
+
 #include "lib/toolsversion/toolsversion_internal.h"
 
 namespace {
@@ -42,18 +44,10 @@ int CheckComponent(const void *, void *data, void *) {
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
   if (size > 16384) return 0;
-  std::string parts[3];
-  int part = 0;
-  for (size_t i = 0; i < size; i++) {
-    if (data[i] == 0 && part < 2) {
-      part++;
-    } else {
-      parts[part] += static_cast<char>(data[i]);
-    }
-  }
+  auto parts = SplitAtNul<3>(data, size);
   DictPtr host = Load(parts[0]);
   if (host == nullptr) return 0;
-  DictPtr avr = part >= 1 ? Load(parts[1]) : nullptr;
+  DictPtr avr = parts[1].empty() ? nullptr : Load(parts[1]);
   DictPtr guest = Load(parts[2]);
   LogSwitches switches;
   TablePtr table = FillTable(host.get(), avr.get(), guest.get(), &switches);

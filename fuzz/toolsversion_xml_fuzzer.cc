@@ -9,6 +9,8 @@
 #include <cstdlib>
 #include <string>
 
+#include "fuzz/split_input.h"
+
 #include "lib/toolsversion/toolsversion_xml.h"
 #include "platform/file.h"
 #include "tvx_log.h"
@@ -38,15 +40,7 @@ struct Files {
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
   static Files files;
   if (size > 32768) return 0;
-  std::string parts[3];
-  int part = 0;
-  for (size_t i = 0; i < size; i++) {
-    if (data[i] == 0 && part < 2) {
-      part++;
-    } else {
-      parts[part] += static_cast<char>(data[i]);
-    }
-  }
+  auto parts = SplitAtNul<3>(data, size);
   tvx::UniquePtr<xmlDoc> doc = ParseXml(parts[0].data(), parts[0].size());
   if (doc == nullptr) return 0;
   if (const xmlNode *root = xmlDocGetRootElement(doc.get())) SavedGuestInfoFromRoot(root);

@@ -54,6 +54,14 @@
  *     status the manifests gave).
  *  7. Parsing XML never reaches the network nor prints to stderr: libxml2
  *     reads with network access off and its error output silenced.
+ *  8. A saved manifest entry whose component name is not an XML name, or
+ *     whose value is not text XML can carry (invalid UTF-8, control
+ *     characters), is skipped with a log line: written out, it would make
+ *     the whole file unreadable and lose every later report.
+ *  9. The extraction of the host manifest goes to the caller's guest
+ *     manifest path with ".iso.shipped" appended, else to the user's private
+ *     temporary directory under a per-thread name; it is removed on every
+ *     path.
  */
 #ifndef TVX_TOOLSVERSION_H
 #define TVX_TOOLSVERSION_H

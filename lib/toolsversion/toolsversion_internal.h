@@ -16,6 +16,7 @@
 #include "platform/dictionary.h"
 #include "platform/hashtable.h"
 #include "platform/log.h"
+#include "platform/msglist.h"
 #include "platform/unique.h"
 #include "tvx_toolsversion.h"
 
@@ -43,6 +44,11 @@ std::string FormatVersion(const ToolsVersionNumber &v, bool inIllegalList = fals
 int CompareToLimit(const ToolsVersionNumber &guest, const ToolsVersionNumber &limit);
 
 // --- Component table --------------------------------------------------------
+
+// LoadDictionary loads the file at `path`, or else the `size` bytes at `buf`;
+// null on failure, with the loader's reasons in *out_messages.
+DictPtr LoadDictionary(const char *path, const char *buf, size_t size,
+                       UniquePtr<MsgList> *out_messages);
 
 struct ComponentInfo {
   ToolsVersionNumber versionInGuest{};

@@ -96,6 +96,17 @@ const char *SkipBlanks(const char *p) {
 
 }  // namespace
 
+DictPtr LoadDictionary(const char *path, const char *buf, size_t size,
+                       UniquePtr<MsgList> *out_messages) {
+  DictPtr dict(Dictionary_Create());
+  MsgList *raw = nullptr;
+  Bool loaded = path != nullptr ? Dictionary_LoadEx(dict.get(), path, &raw)
+                                : Dictionary_LoadFromBufferEx(dict.get(), buf, size, &raw);
+  out_messages->reset(raw);
+  if (!loaded) dict.reset();
+  return dict;
+}
+
 TablePtr NewComponentTable() {
   return TablePtr(HashTable_Alloc(128, HASH_ISTRING_KEY | HASH_FLAG_COPYKEY, FreeComponent));
 }
@@ -208,14 +219,11 @@ DictPtr LoadAvr(const char *avrPath) {
     TV_LOG("Error signature check failed for AVR manifest '%s'.\n", avrPath);
     return nullptr;
   }
-  DictPtr dict(Dictionary_Create());
-  MsgList *rawMessages = nullptr;
-  Bool loaded = Dictionary_LoadFromBufferEx(dict.get(), data.get(), size, &rawMessages);
-  UniquePtr<MsgList> messages(rawMessages);
-  if (!loaded) {
+  UniquePtr<MsgList> messages;
+  DictPtr dict = LoadDictionary(nullptr, data.get(), size, &messages);
+  if (dict == nullptr) {
     CharPtr text(MsgList_ToEnglishString(messages.get()));
     TV_LOG("Error loading dictionary from AVR manifest '%s': %s.\n", avrPath, text.get());
-    return nullptr;
   }
   return dict;
 }
@@ -244,11 +252,9 @@ TablePtr FillTable(const Dictionary *host, const Dictionary *avr, const Dictiona
 
 TablePtr LoadManifests(const char *hostPath, const char *avrPath, const Dictionary *guest,
                        LogSwitches *switches) {
-  DictPtr host(Dictionary_Create());
-  MsgList *rawMessages = nullptr;
-  Bool loaded = Dictionary_LoadEx(host.get(), hostPath, &rawMessages);
-  UniquePtr<MsgList> messages(rawMessages);
-  if (!loaded) {
+  UniquePtr<MsgList> messages;
+  DictPtr host = LoadDictionary(hostPath, nullptr, 0, &messages);
+  if (host == nullptr) {
     CharPtr text(MsgList_ToEnglishString(messages.get()));
     TV_LOG("Error loading dictionary from host manifest: '%s': %s.\n", hostPath, text.get());
     return nullptr;

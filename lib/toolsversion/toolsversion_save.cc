@@ -183,11 +183,9 @@ bool SaveXmlInfo(const char *configPath, const char *updateAgentXml, const char 
                  int32_t installError, int32_t updateCounter) {
   if (IsEmpty(updateAgentXml) && IsEmpty(manifestText) && updateCounter == 0) return true;
 
-  DictPtr config(Dictionary_Create());
-  MsgList *rawMessages = nullptr;
-  Bool loaded = Dictionary_LoadEx(config.get(), configPath, &rawMessages);
-  UniquePtr<MsgList> messages(rawMessages);
-  if (!loaded) {
+  UniquePtr<MsgList> messages;
+  DictPtr config = LoadDictionary(configPath, nullptr, 0, &messages);
+  if (config == nullptr) {
     TV_LOG("Error loading dictionary for tvxx config file.");
     MsgList_Log(messages.get());
     TV_LOG("Error getting extended config file path.\n");

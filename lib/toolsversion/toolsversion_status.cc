@@ -72,12 +72,10 @@ uint32_t NewestDiskToolsVersion(const SnapshotStringList *disks) {
 DictPtr GuestFromSources(const char *configPath, Dictionary *config,
                          const char *guestManifestPath, const char *guestManifestText,
                          uint32_t *status, Report *report) {
-  DictPtr guest(Dictionary_Create());
   if (guestManifestPath != nullptr) {
-    MsgList *raw = nullptr;
-    Bool loaded = Dictionary_LoadEx(guest.get(), guestManifestPath, &raw);
-    UniquePtr<MsgList> messages(raw);
-    if (!loaded) {
+    UniquePtr<MsgList> messages;
+    DictPtr guest = LoadDictionary(guestManifestPath, nullptr, 0, &messages);
+    if (guest == nullptr) {
       TV_LOG("Error loading dictionary for guest manifest.");
       MsgList_Log(messages.get());
       return nullptr;
@@ -87,6 +85,7 @@ DictPtr GuestFromSources(const char *configPath, Dictionary *config,
   }
   if (guestManifestText != nullptr) {
     if (guestManifestText[0] == '\0') return nullptr;
+    DictPtr guest(Dictionary_Create());
     if (!Dictionary_LoadFromBuffer(guest.get(), guestManifestText,
                                    std::strlen(guestManifestText))) {
       CharPtr messages(Msg_GetMessagesAndReset());
