@@ -112,7 +112,8 @@ typedef enum ToolsVersionStatus {
 /* ToolsVersion_GetStatus tells how the guest tools of the machine stand.
  *  configPath         the machine's configuration file (messages, the
  *                     extended config file, the virtual disks)
- *  config             its loaded configuration: "guestOS", "libdir" (default
+ *  config             its loaded configuration (NULL reads as empty):
+ *                     "guestOS", "libdir" (default
  *                     "/usr/lib/tarvex"), "tools.hint.imageName",
  *                     "extendedConfigFile", the disk entries
  *  guestManifestPath  optional guest manifest file

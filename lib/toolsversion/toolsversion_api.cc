@@ -70,6 +70,9 @@ TVX_EXPORT uint32_t ToolsVersion_GetStatusReport(const char *configPath, Diction
   if (out_report != nullptr) *out_report = nullptr;
   try {
     tvx::toolsversion::Report report;
+    // A missing configuration reads as an empty one: no guest OS, no files.
+    tvx::toolsversion::DictPtr empty(config == nullptr ? Dictionary_Create() : nullptr);
+    if (config == nullptr) config = empty.get();
     uint32_t status = tvx::toolsversion::GetStatus(configPath, config, guestManifestPath,
                                                    guestManifestText, toolsVersion, mode,
                                                    &report);
