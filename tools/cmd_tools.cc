@@ -44,7 +44,8 @@ namespace {
 constexpr const char *kCmd = "tools image";
 
 constexpr const char *kUsage =
-    "Usage: tvxguest tools image [--hint NAME] [--unsigned-ok] [--json] TOOLSDIR GUESTOS\n\n"
+    "Usage: tvxguest tools image [--hint NAME] [--unsigned-ok] [--cert FILE] [--json]\n"
+    "                            TOOLSDIR GUESTOS\n\n"
     "Chooses the guest-tools ISO image for guest GUESTOS (an identifier such as\n"
     "\"windows9-64\") from TOOLSDIR/isoimages: the signed image map\n"
     "isoimages_manifest.txt when it exists, else the built-in family table.\n"
@@ -54,6 +55,8 @@ constexpr const char *kUsage =
     "                 map, the table) lists it\n"
     "  --unsigned-ok  accept an image map without its signature file (a bad\n"
     "                 signature is never accepted)\n"
+    "  --cert FILE    trust the maker certificates in FILE instead of the installed\n"
+    "                 ones (for publishers checking their own signing keys)\n"
     "  --json         print one JSON object: {\"image\", \"baseName\", \"isoOpenMode\",\n"
     "                 \"source\"}\n"
     "  -h, --help     show this help\n\n"
@@ -61,7 +64,7 @@ constexpr const char *kUsage =
     "64 usage error.\n";
 
 int Image(const std::vector<std::string> &args) {
-  std::string hint;
+  std::string hint, cert;
   bool hasHint = false, unsignedOk = false, json = false;
   std::vector<std::string> pos;
   for (size_t i = 0; i < args.size(); i++) {
@@ -72,6 +75,8 @@ int Image(const std::vector<std::string> &args) {
     } else if (a == "--hint" && i + 1 < args.size()) {
       hint = args[++i];
       hasHint = true;
+    } else if (a == "--cert" && i + 1 < args.size()) {
+      cert = args[++i];
     } else if (a == "--unsigned-ok") {
       unsignedOk = true;
     } else if (a == "--json") {
@@ -87,8 +92,9 @@ int Image(const std::vector<std::string> &args) {
   LogLines log;
   char *path = nullptr, *base = nullptr;
   uint32_t mode = 0;
-  Bool ok = ToolsISO_GetImagePath(pos[0].c_str(), pos[1].c_str(), hasHint ? hint.c_str() : nullptr,
-                                  unsignedOk ? FALSE : TRUE, &path, &base, &mode);
+  Bool ok = ToolsISO_GetImagePathEx(pos[0].c_str(), pos[1].c_str(),
+                                    hasHint ? hint.c_str() : nullptr, unsignedOk ? FALSE : TRUE,
+                                    cert.empty() ? nullptr : cert.c_str(), &path, &base, &mode);
   if (!ok) {
     std::fprintf(stderr, "tvxguest: no tools image for '%s'\n", pos[1].c_str());
     log.Print(stderr);

@@ -79,6 +79,14 @@ typedef struct ToolsIsoRemoteFile ToolsIsoRemoteFile;
 TVX_EXPORT Bool ToolsISO_GetImagePath(const char *toolsDir, const char *guestOS, const char *hint,
                                       Bool requireSignature, char **out_imagePath,
                                       char **out_imageBaseName, uint32_t *out_isoOpenMode);
+/* ToolsISO_GetImagePathEx is ToolsISO_GetImagePath checking the map's
+ * signature against the maker certificates in `certFile` (optional; NULL:
+ * the installed ones), as ToolsISO_VerifySignature's certName does. For
+ * publishers checking their own signing keys; a host passes NULL. */
+TVX_EXPORT Bool ToolsISO_GetImagePathEx(const char *toolsDir, const char *guestOS,
+                                        const char *hint, Bool requireSignature,
+                                        const char *certFile, char **out_imagePath,
+                                        char **out_imageBaseName, uint32_t *out_isoOpenMode);
 /* ToolsISO_GetImageBaseName returns the family image name of a numeric guest
  * id ("windows.iso", "linux.iso", ...), a constant, or NULL when the guest
  * has no tools image. */
@@ -118,6 +126,10 @@ TVX_EXPORT Bool ToolsISO_GetHttpHashInfo(void *connection, const char *imageUrl,
  * With `requireHash` FALSE an image without hash data opens unchecked. */
 TVX_EXPORT int ToolsISO_LocalFileOpen(const char *imagePath, Bool requireHash,
                                       ToolsIsoLocalFile **out_handle);
+/* ToolsISO_LocalFileOpenEx: the same, trusting `certFile` (optional) as
+ * ToolsISO_GetImagePathEx does. */
+TVX_EXPORT int ToolsISO_LocalFileOpenEx(const char *imagePath, Bool requireHash,
+                                        const char *certFile, ToolsIsoLocalFile **out_handle);
 /* ToolsISO_LocalFileReadCB reads up to `length` bytes at `offset`, fewer only
  * at the image's end; *out_bytesRead (optional) gets the count. Without
  * out_bytesRead a short read is a failure. Every block read is checked
@@ -137,6 +149,8 @@ TVX_EXPORT Bool ToolsISO_LocalFileCloseCB(void *handle);
  * keeps one connection open until it is closed. */
 TVX_EXPORT int ToolsISO_RemoteFileOpen(const char *imageUrl, Bool requireHash,
                                        ToolsIsoRemoteFile **out_handle);
+TVX_EXPORT int ToolsISO_RemoteFileOpenEx(const char *imageUrl, Bool requireHash,
+                                         const char *certFile, ToolsIsoRemoteFile **out_handle);
 TVX_EXPORT Bool ToolsISO_RemoteFileReadCB(void *handle, void *buffer, size_t length,
                                           uint64_t offset, size_t *out_bytesRead);
 TVX_EXPORT Bool ToolsISO_RemoteFileIsoReadCB(void *handle, void *buffer, size_t length,

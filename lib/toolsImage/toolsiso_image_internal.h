@@ -15,10 +15,20 @@ struct HttpConnection;
 
 namespace tvx::toolsiso {
 
+// `certFile` below names the maker certificates to trust for signatures
+// (null: the installed ones), as ToolsISO_VerifySignature takes it.
+
 // LoadImageMap checks the map's detached signature ("<mapPath>.sig") and
 // loads its bytes as a dictionary; null (logged) on any failure.
 Dictionary *LoadImageMap(const char *mapPath, const char *bytes, size_t size,
-                         Bool requireSignature);
+                         Bool requireSignature, const char *certFile);
+
+// The hash-info sources behind ToolsISO_GetLocalFileHashInfo and
+// ToolsISO_GetHttpHashInfo (*out_info is null on entry).
+Bool LocalHashInfo(const char *imagePath, uint64_t imageSize, Bool requireHash,
+                   const char *certFile, ToolsIsoHashInfo **out_info);
+Bool HttpHashInfo(HttpConnection *conn, const char *imageUrl, uint64_t imageSize,
+                  Bool requireHash, const char *certFile, ToolsIsoHashInfo **out_info);
 
 // MakeCompanionUrl inserts "." and `suffix` after the first ".iso" of `url`;
 // "" (logged) when the URL has no ".iso".

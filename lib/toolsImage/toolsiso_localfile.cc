@@ -72,7 +72,8 @@ Bool Read(ToolsIsoLocalFile *h, void *buffer, size_t length, uint64_t offset,
   return TRUE;
 }
 
-int OpenLocal(const char *imagePath, Bool requireHash, ToolsIsoLocalFile **out_handle) {
+int OpenLocal(const char *imagePath, Bool requireHash, const char *certFile,
+              ToolsIsoLocalFile **out_handle) {
   ToolsIsoLocalFile *h = NewHandle();
   tvx::CharPtr real(ToolsISO_GetRealPath(imagePath));
   FileIOResult rc = FileIO_Open(&h->fd, real.get(), FILEIO_OPEN_ACCESS_READ | FILEIO_OPEN_LARGEFILE,
@@ -88,7 +89,7 @@ int OpenLocal(const char *imagePath, Bool requireHash, ToolsIsoLocalFile **out_h
     CloseHandle(h);
     return TOOLSISO_OPEN_IO_ERROR;
   }
-  if (!ToolsISO_GetLocalFileHashInfo(real.get(), h->size, requireHash, &h->info)) {
+  if (!tvx::toolsiso::LocalHashInfo(real.get(), h->size, requireHash, certFile, &h->info)) {
     CloseHandle(h);
     return TOOLSISO_OPEN_HASH_ERROR;
   }
@@ -96,7 +97,8 @@ int OpenLocal(const char *imagePath, Bool requireHash, ToolsIsoLocalFile **out_h
   return TOOLSISO_OPEN_OK;
 }
 
-int OpenRemote(const char *imageUrl, Bool requireHash, ToolsIsoRemoteFile **out_handle) {
+int OpenRemote(const char *imageUrl, Bool requireHash, const char *certFile,
+               ToolsIsoRemoteFile **out_handle) {
   auto *h = static_cast<ToolsIsoRemoteFile *>(UtilSafeCalloc0(1, sizeof(ToolsIsoRemoteFile)));
   FileIO_Invalidate(&h->fd);
   h->url = UtilSafeStrdup0(imageUrl);
@@ -107,7 +109,7 @@ int OpenRemote(const char *imageUrl, Bool requireHash, ToolsIsoRemoteFile **out_
     CloseHandle(h);
     return TOOLSISO_OPEN_IO_ERROR;
   }
-  if (!ToolsISO_GetHttpHashInfo(h->conn, imageUrl, h->size, requireHash, &h->info)) {
+  if (!tvx::toolsiso::HttpHashInfo(h->conn, imageUrl, h->size, requireHash, certFile, &h->info)) {
     CloseHandle(h);
     return TOOLSISO_OPEN_HASH_ERROR;
   }
@@ -120,10 +122,15 @@ int OpenRemote(const char *imageUrl, Bool requireHash, ToolsIsoRemoteFile **out_
 extern "C" {
 
 int ToolsISO_LocalFileOpen(const char *imagePath, Bool requireHash, ToolsIsoLocalFile **out_handle) {
+  return ToolsISO_LocalFileOpenEx(imagePath, requireHash, nullptr, out_handle);
+}
+
+int ToolsISO_LocalFileOpenEx(const char *imagePath, Bool requireHash, const char *certFile,
+                             ToolsIsoLocalFile **out_handle) {
   if (out_handle != nullptr) *out_handle = nullptr;
   if (imagePath == nullptr || out_handle == nullptr) return TOOLSISO_OPEN_IO_ERROR;
   try {
-    return OpenLocal(imagePath, requireHash, out_handle);
+    return OpenLocal(imagePath, requireHash, certFile, out_handle);
   } catch (...) {
     return TOOLSISO_OPEN_IO_ERROR;
   }
@@ -149,10 +156,15 @@ Bool ToolsISO_LocalFileCloseCB(void *handle) {
 }
 
 int ToolsISO_RemoteFileOpen(const char *imageUrl, Bool requireHash, ToolsIsoRemoteFile **out_handle) {
+  return ToolsISO_RemoteFileOpenEx(imageUrl, requireHash, nullptr, out_handle);
+}
+
+int ToolsISO_RemoteFileOpenEx(const char *imageUrl, Bool requireHash, const char *certFile,
+                              ToolsIsoRemoteFile **out_handle) {
   if (out_handle != nullptr) *out_handle = nullptr;
   if (imageUrl == nullptr || out_handle == nullptr) return TOOLSISO_OPEN_IO_ERROR;
   try {
-    return OpenRemote(imageUrl, requireHash, out_handle);
+    return OpenRemote(imageUrl, requireHash, certFile, out_handle);
   } catch (...) {
     return TOOLSISO_OPEN_IO_ERROR;
   }

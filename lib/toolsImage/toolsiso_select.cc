@@ -144,7 +144,8 @@ char *NameFromMap(const Dictionary *map, const char *mapPath, const char *guestO
   return name.release();
 }
 
-char *NameWithoutHint(const char *mapPath, const char *guestOS, Bool requireSignature) {
+char *NameWithoutHint(const char *mapPath, const char *guestOS, Bool requireSignature,
+                      const char *certFile) {
   uint32_t lastCount = g_lastCount.load(std::memory_order_relaxed);
   uint32_t refreshCount = g_refreshCount.load(std::memory_order_acquire);
   char *cached = g_cachedName.load(std::memory_order_acquire);
@@ -161,7 +162,8 @@ char *NameWithoutHint(const char *mapPath, const char *guestOS, Bool requireSign
   CharPtr name;
   MapFile map = ReadMap(mapPath);
   if (map.read) {
-    UniquePtr<Dictionary> dict(LoadImageMap(map.path.get(), map.bytes.get(), map.size, requireSignature));
+    UniquePtr<Dictionary> dict(
+        LoadImageMap(map.path.get(), map.bytes.get(), map.size, requireSignature, certFile));
     if (dict) name.reset(NameFromMap(dict.get(), map.path.get(), guestOS));
   } else if (const TableRow *row = FindRow(GuestOS_GetOSIDByName(guestOS))) {
     if (row->image != nullptr) name.reset(UtilSafeStrdup0(row->image));
@@ -187,10 +189,12 @@ Bool CollectValue(const char *, const char *value, void *ctx) {
   return TRUE;
 }
 
-bool HintAccepted(const char *mapPath, const char *hint, Bool requireSignature) {
+bool HintAccepted(const char *mapPath, const char *hint, Bool requireSignature,
+                  const char *certFile) {
   MapFile map = ReadMap(mapPath);
   if (map.read) {
-    UniquePtr<Dictionary> dict(LoadImageMap(map.path.get(), map.bytes.get(), map.size, requireSignature));
+    UniquePtr<Dictionary> dict(
+        LoadImageMap(map.path.get(), map.bytes.get(), map.size, requireSignature, certFile));
     if (dict) {
       UniquePtr<HashTable> names(HashTable_Alloc(64, HASH_STRING_KEY | HASH_FLAG_COPYKEY, nullptr));
       Dictionary_Iterate(dict.get(), CollectValue, names.get());
@@ -207,22 +211,22 @@ bool HintAccepted(const char *mapPath, const char *hint, Bool requireSignature) 
 }
 
 Bool GetImagePath(const char *toolsDirArg, const char *guestOS, const char *hint,
-                  Bool requireSignature, char **out_imagePath, char **out_imageBaseName,
-                  uint32_t *out_isoOpenMode) {
+                  Bool requireSignature, const char *certFile, char **out_imagePath,
+                  char **out_imageBaseName, uint32_t *out_isoOpenMode) {
   const char *toolsDir = StoredToolsDir(toolsDirArg);
   if (toolsDir == nullptr) return FALSE;
   CharPtr mapPath(Str_SafeAsprintf(nullptr, "%s/isoimages/%s", toolsDir, kMapName));
 
   CharPtr name;
   if (hint == nullptr) {
-    name.reset(NameWithoutHint(mapPath.get(), guestOS, requireSignature));
+    name.reset(NameWithoutHint(mapPath.get(), guestOS, requireSignature, certFile));
   } else {
     if (!ToolsISO_ValidateName(hint)) {
       Log("ToolsISO: Error invalid Tools image name: '%s'\n", hint);
       LogBadHint(hint);
       return FALSE;
     }
-    if (!HintAccepted(mapPath.get(), hint, requireSignature)) return FALSE;
+    if (!HintAccepted(mapPath.get(), hint, requireSignature, certFile)) return FALSE;
     name.reset(UtilSafeStrdup0(hint));
   }
   if (!name) return FALSE;
@@ -242,7 +246,7 @@ Bool GetImagePath(const char *toolsDirArg, const char *guestOS, const char *hint
 }  // namespace
 
 Dictionary *LoadImageMap(const char *mapPath, const char *bytes, size_t size,
-                         Bool requireSignature) {
+                         Bool requireSignature, const char *certFile) {
   CharPtr sigPath(Str_SafeAsprintf(nullptr, "%s.sig", mapPath));
   char *sigBuf = nullptr;
   size_t sigSize = 0;
@@ -254,7 +258,7 @@ Dictionary *LoadImageMap(const char *mapPath, const char *bytes, size_t size,
     Log("ToolsISO: Unable to read signature file '%s', ignoring.\n", sigPath.get());
   } else {
     CharPtr sig(sigBuf);
-    if (!ToolsISO_VerifySignature(nullptr, sig.get(), sigSize, bytes, size)) {
+    if (!ToolsISO_VerifySignature(certFile, sig.get(), sigSize, bytes, size)) {
       Log("ToolsISO: Error signature check failed for Tools image map '%s'.\n", mapPath);
       return nullptr;
     }
@@ -287,12 +291,19 @@ extern "C" {
 Bool ToolsISO_GetImagePath(const char *toolsDir, const char *guestOS, const char *hint,
                            Bool requireSignature, char **out_imagePath, char **out_imageBaseName,
                            uint32_t *out_isoOpenMode) {
+  return ToolsISO_GetImagePathEx(toolsDir, guestOS, hint, requireSignature, nullptr, out_imagePath,
+                                 out_imageBaseName, out_isoOpenMode);
+}
+
+Bool ToolsISO_GetImagePathEx(const char *toolsDir, const char *guestOS, const char *hint,
+                             Bool requireSignature, const char *certFile, char **out_imagePath,
+                             char **out_imageBaseName, uint32_t *out_isoOpenMode) {
   if (out_imagePath != nullptr) *out_imagePath = nullptr;
   if (out_imageBaseName != nullptr) *out_imageBaseName = nullptr;
   if (out_isoOpenMode != nullptr) *out_isoOpenMode = 0;
   if (toolsDir == nullptr || guestOS == nullptr || out_imagePath == nullptr) return FALSE;
   try {
-    return GetImagePath(toolsDir, guestOS, hint, requireSignature, out_imagePath,
+    return GetImagePath(toolsDir, guestOS, hint, requireSignature, certFile, out_imagePath,
                         out_imageBaseName, out_isoOpenMode);
   } catch (...) {
     return FALSE;

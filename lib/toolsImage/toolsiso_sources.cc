@@ -25,15 +25,16 @@ constexpr uint64_t kMinSignatureCeiling = 64 * 1024;
 
 // CheckSignature verifies the embedded signature of `info`, or the detached
 // one when there is none.
-bool CheckSignature(const ToolsIsoHashInfo &info, const void *detached, size_t detachedLen) {
+bool CheckSignature(const ToolsIsoHashInfo &info, const void *detached, size_t detachedLen,
+                    const char *certFile) {
   HashDataHeader h = HeaderOf(info);
   uint64_t signedSize = SignedSize(info);
   if (h.signatureOffset != 0) {
-    return ToolsISO_VerifySignature(nullptr, info.data + h.signatureOffset,
+    return ToolsISO_VerifySignature(certFile, info.data + h.signatureOffset,
                                     static_cast<size_t>(h.signatureSize), info.data,
                                     static_cast<size_t>(signedSize));
   }
-  return ToolsISO_VerifySignature(nullptr, detached, detachedLen, info.data,
+  return ToolsISO_VerifySignature(certFile, detached, detachedLen, info.data,
                                   static_cast<size_t>(signedSize));
 }
 
@@ -51,8 +52,10 @@ ToolsIsoHashInfo *Parse(char *buf, uint64_t size, const char *what) {
   return info;
 }
 
+}  // namespace
+
 Bool LocalHashInfo(const char *imagePath, uint64_t imageSize, Bool requireHash,
-                   ToolsIsoHashInfo **out_info) {
+                   const char *certFile, ToolsIsoHashInfo **out_info) {
   CharPtr real(ToolsISO_GetRealPath(imagePath));
   CharPtr hashPath(Str_SafeAsprintf(nullptr, "%s.sha", real.get()));
   char *buf = nullptr;
@@ -88,7 +91,7 @@ Bool LocalHashInfo(const char *imagePath, uint64_t imageSize, Bool requireHash,
       return FALSE;
     }
   }
-  if (!CheckSignature(*info, sig.get(), sigSize)) {
+  if (!CheckSignature(*info, sig.get(), sigSize, certFile)) {
     Log("ToolsISO: Signature verification failed for '%s'.\n", real.get());
     return FALSE;
   }
@@ -96,14 +99,18 @@ Bool LocalHashInfo(const char *imagePath, uint64_t imageSize, Bool requireHash,
   return TRUE;
 }
 
+namespace {
+
 // Fetch reads a whole companion file of `size` bytes into a zeroed buffer.
 HttpError Fetch(HttpConnection *conn, const std::string &url, uint64_t size, CharPtr *out) {
   out->reset(static_cast<char *>(UtilSafeCalloc0(1, static_cast<size_t>(size) + 1)));
   return Http_Read(conn, url.c_str(), 0, out->get(), static_cast<size_t>(size), nullptr, nullptr);
 }
 
+}  // namespace
+
 Bool HttpHashInfo(HttpConnection *conn, const char *imageUrl, uint64_t imageSize,
-                  Bool requireHash, ToolsIsoHashInfo **out_info) {
+                  Bool requireHash, const char *certFile, ToolsIsoHashInfo **out_info) {
   std::string hashUrl = MakeCompanionUrl(imageUrl, "sha");
   const char *hashArg = hashUrl.empty() ? nullptr : hashUrl.c_str();
   uint64_t size = 0;
@@ -151,15 +158,13 @@ Bool HttpHashInfo(HttpConnection *conn, const char *imageUrl, uint64_t imageSize
       return FALSE;
     }
   }
-  if (!CheckSignature(*info, sig.get(), static_cast<size_t>(sigSize))) {
+  if (!CheckSignature(*info, sig.get(), static_cast<size_t>(sigSize), certFile)) {
     Log("ToolsISO: Signature verification failed for '%s'.\n", imageUrl);
     return FALSE;
   }
   *out_info = info.release();
   return TRUE;
 }
-
-}  // namespace
 
 uint64_t MaxDetachedSignature(uint64_t signedSize) {
   return signedSize > kMinSignatureCeiling ? signedSize : kMinSignatureCeiling;
@@ -186,7 +191,7 @@ Bool ToolsISO_GetLocalFileHashInfo(const char *imagePath, uint64_t imageSize, Bo
   if (out_info != nullptr) *out_info = nullptr;
   if (imagePath == nullptr || out_info == nullptr) return FALSE;
   try {
-    return LocalHashInfo(imagePath, imageSize, requireHash, out_info);
+    return LocalHashInfo(imagePath, imageSize, requireHash, nullptr, out_info);
   } catch (...) {
     return FALSE;
   }
@@ -208,7 +213,7 @@ Bool ToolsISO_GetHttpHashInfo(void *connection, const char *imageUrl, uint64_t i
       }
       own.reset(conn);
     }
-    Bool ok = HttpHashInfo(conn, imageUrl, imageSize, requireHash, out_info);
+    Bool ok = HttpHashInfo(conn, imageUrl, imageSize, requireHash, nullptr, out_info);
     if (own) {
       HttpError e = Http_Close(own.release());
       if (e != HTTP_OK) {

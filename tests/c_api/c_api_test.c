@@ -211,6 +211,25 @@ static void TestSignature(void) {
   ToolsISO_FreeHashInfo(NULL);
 }
 
+static void TestToolsImage(void) {
+  ToolsIsoLocalFile *local = NULL;
+  ToolsIsoHashInfo *info = NULL;
+  ToolsIsoImageInfo imageInfo;
+  char *path = NULL;
+  phase = "tools_image";
+  CHECK(ToolsISO_ValidateName("linux.iso"));
+  CHECK(!ToolsISO_ValidateName("../linux.iso"));
+  CHECK(ToolsISO_GetImageBaseName(20510) != NULL);
+  CHECK(ToolsISO_GetRefreshCount() >= 1);
+  CHECK(!ToolsISO_GetImagePath("/nonexistent/tvx-tools", "rhel6", NULL, TRUE, &path, NULL, NULL));
+  CHECK(path == NULL);
+  CHECK(ToolsISO_LocalFileOpen("/nonexistent/tvx-tools.iso", FALSE, &local) == TOOLSISO_OPEN_IO_ERROR);
+  CHECK(local == NULL);
+  CHECK(ToolsISO_GetLocalFileHashInfo("/nonexistent/tvx-tools.iso", 1, FALSE, &info));
+  CHECK(info == NULL);
+  CHECK(!ToolsISO_GetImageInfo(NULL, &imageInfo));
+}
+
 int main(void) {
   TestBase();
   TestGuess();
@@ -221,6 +240,7 @@ int main(void) {
   TestAutoInstall();
   TestWindowsAnswers();
   TestSignature();
+  TestToolsImage();
   if (failures == 0) printf("c_api: all phases passed\n");
   return failures == 0 ? 0 : 1;
 }
