@@ -23,12 +23,6 @@
 #include "platform/unique.h"
 #include "platform/util.h"
 
-namespace tvx {
-TVX_MAKE_DELETER(Dictionary, Dictionary_Free);
-TVX_MAKE_DELETER(HashTable, HashTable_Free);
-TVX_MAKE_DELETER(MsgList, MsgList_Free);
-}  // namespace tvx
-
 namespace tvx::toolsiso {
 namespace {
 

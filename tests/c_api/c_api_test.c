@@ -188,6 +188,37 @@ static void TestIso9660(void) {
   CHECK(sizeof(((Iso9660DirEntry *)0)->name) == 256);
 }
 
+/* Builds a VM configuration through the exported dictionary calls and asks
+ * for a tools status that needs no file: mode 5 is never applicable, and a
+ * guest that reported no tools with legacy number 0 has none. */
+static void TestToolsVersion(void) {
+  Dictionary *config = Dictionary_Create();
+  char *value;
+  ToolsVersionReport *report = NULL;
+  phase = "toolsversion";
+  CHECK(Dict_SetString(config, "winXPPro", "%s", "guestOS"));
+  CHECK(!Dict_SetString(config, "x", "bad name"));
+  value = Dict_GetString(config, NULL, "guestOS");
+  CHECK(value != NULL && strcmp(value, "winXPPro") == 0);
+  free(value);
+  value = Dict_GetString(config, "dflt", "libdir");
+  CHECK(value != NULL && strcmp(value, "dflt") == 0);
+  free(value);
+  CHECK(!Dictionary_LoadEx(config, "/nonexistent/tvx-vm.tvx", NULL));
+  CHECK(ToolsVersion_GetStatus("/nonexistent/vm.tvx", config, NULL, "", 10252, 5) ==
+        TOOLS_STATUS_NOT_APPLICABLE);
+  CHECK(ToolsVersion_GetStatusReport("/nonexistent/vm.tvx", config, NULL, "", 0, 0, &report) ==
+        TOOLS_STATUS_NOT_INSTALLED);
+  CHECK(report != NULL && report->status == TOOLS_STATUS_NOT_INSTALLED && !report->evaluated);
+  ToolsVersion_FreeReport(report);
+  CHECK(ToolsVersion_SaveXmlInfo("/nonexistent/vm.tvx", NULL, NULL, 3, 0));
+  CHECK(!ToolsVersion_SaveXmlInfo("/nonexistent/vm.tvx", "null", NULL, 3, 1));
+  CHECK(strcmp(ToolsVersion_ComponentStatusText(TOOLS_COMPONENT_MISSING),
+               "missing from the guest") == 0);
+  CHECK(strcmp(ToolsVersion_StatusName(42), "TOOLS_STATUS_INVALID") == 0);
+  Dictionary_Free(config);
+}
+
 static void TestGuess(void) {
   phase = "guess";
   GuessResult r;
@@ -243,6 +274,7 @@ static void TestToolsImage(void) {
 int main(void) {
   TestBase();
   TestGuess();
+  TestToolsVersion();
   TestIso9660();
   TestUdf();
   TestIni();
