@@ -15,6 +15,7 @@
 
 #include "platform/ascii.h"
 #include "lib/guestInstall/autoinstall_internal.h"
+#include "lib/guestInstall/autoinstall_linux_internal.h"
 #include "lib/guestInstall/autoinstall_linux_media_internal.h"
 #include "platform/fd_io.h"
 #include "platform/file.h"
@@ -319,7 +320,7 @@ bool Scan(Medium &m, const std::string &treeDir, const char *guestOS, uint32_t v
 
   std::string cfgPath = Join(treeDir, "isolinux.cfg"), text;
   int err = 0;
-  if (!BootConfigText(kernelBase, initrdBase, entry.append, LinuxBootArguments(kind), &text) ||
+  if (!BootConfigText(kernelBase, initrdBase, entry.append, LinuxRow(kind)->bootArguments, &text) ||
       !File_ReplaceContents(cfgPath.c_str(), text, {}, &err)) {
     if (m.Logs()) {
       Log("%s: FileIO_Open failed errio=%d configPath=\"%s\"\n", kScanDisk, err, cfgPath.c_str());

@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "lib/guestInstall/autoinstall_internal.h"
+#include "lib/guestInstall/autoinstall_linux_internal.h"
 #include "lib/guestInstall/autoinstall_linux_media_internal.h"
 #include "platform/fd_io.h"
 #include "platform/file.h"
@@ -37,22 +38,11 @@ std::string NotAnOption(const std::string &path) {
 
 }  // namespace
 
-// TODO(linuxans): read linuxAnswerFileTable once it is merged.
-const char *LinuxBootArguments(AutoInstallLinuxKind kind) {
-  switch (kind) {
-    case AUTOINSTALL_LINUX_REDHAT: return "ks=cdrom:/ks.cfg";
-    default: return "";
+const LinuxAnswerFileRow *LinuxRow(AutoInstallLinuxKind kind) {
+  if (kind <= AUTOINSTALL_LINUX_NONE || kind >= static_cast<int>(kLinuxAnswerFileRows)) {
+    return &linuxAnswerFileTable[AUTOINSTALL_LINUX_NONE];
   }
-}
-const char *LinuxAnswerFileName(AutoInstallLinuxKind kind) {
-  switch (kind) {
-    case AUTOINSTALL_LINUX_REDHAT: return "ks.cfg";
-    case AUTOINSTALL_LINUX_UBUNTU: return "preseed.cfg";
-    case AUTOINSTALL_LINUX_SUSE:
-    case AUTOINSTALL_LINUX_SLES10: return "autoinst.xml";
-    case AUTOINSTALL_LINUX_MANDRIVA: return "auto_i~1.cfg";
-    default: return nullptr;
-  }
+  return &linuxAnswerFileTable[kind];
 }
 
 bool CopyReplacing(const char *from, const char *to) {
@@ -79,13 +69,13 @@ using namespace tvx::autoinstall;
 extern "C" {
 
 TVX_EXPORT Bool AutoInstall_NeedsFloppy_Linux(const char *guestOS) {
-  switch (AutoInstallGetLinuxKind(guestOS)) {
-    case AUTOINSTALL_LINUX_UBUNTU:
-    case AUTOINSTALL_LINUX_SUSE:
-    case AUTOINSTALL_LINUX_SLES10:
-    case AUTOINSTALL_LINUX_MANDRIVA: return TRUE;
-    default: return FALSE;
-  }
+  return LinuxRow(AutoInstallGetLinuxKind(guestOS))->needsFloppy ? TRUE : FALSE;
+}
+
+// TODO(floppy): the FAT layer is merged next.
+TVX_EXPORT Bool AutoInstall_MakeFloppyImg_Linux(const char *answerDir, const char *floppyDir,
+                                                const char *templateDir, const char *guestOS) {
+  return FALSE;
 }
 
 TVX_EXPORT Bool AutoInstall_AddTools_Linux(const char *destinationDir, const char *toolsDir) {

@@ -35,9 +35,10 @@ bool NeedsLdlinux(std::string_view isolinuxBin);
 bool BootConfigText(const std::string &kernelBase, const std::string &initrdBase,
                     const std::string &append, const char *bootArguments, std::string *out);
 
-// The row of the Linux answer-file table that the media read.
-const char *LinuxBootArguments(AutoInstallLinuxKind kind);
-const char *LinuxAnswerFileName(AutoInstallLinuxKind kind);
+struct LinuxAnswerFileRow;
+// LinuxRow: the row of the Linux answer-file table for `kind`, as it is at
+// the moment of the call; the empty row 0 for values outside the table.
+const LinuxAnswerFileRow *LinuxRow(AutoInstallLinuxKind kind);
 
 // CopyReplacing copies the host file `from` to `to` through a temporary file
 // and a rename; false (errno set) on failure.

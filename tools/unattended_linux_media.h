@@ -1,0 +1,66 @@
+// The medium a Linux guest's installer reads its answer file from, for the
+// `unattended` subcommands: "autoinst.flp", or the boot tree mastered into
+// "autoinst.iso".
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "tvx_guess.h"
+
+namespace tvxcli {
+
+struct LinuxMediaOptions {
+  std::string mediaDir;     // --media: where autoinst.iso / autoinst.flp go
+  std::string mkisofs;      // --mkisofs (empty: DefaultMkisofs())
+  std::string isolinuxBin;  // --isolinux-bin (empty: the medium's)
+  std::string templateDir;  // --floppy-templates: suse.flp, mandriva.flp
+  std::string toolsDir;     // --tools: guest-tools installer files for the CD
+};
+
+// TakeLinuxMediaOption consumes the media option at args[*i] ("--media DIR"
+// or "--media=DIR", ...): 1 taken, 0 not a media option, or the exit status
+// of a usage error (64) for a missing value.
+int TakeLinuxMediaOption(const char *cmd, const std::vector<std::string> &args, size_t *i,
+                         LinuxMediaOptions *o);
+
+// The help lines of the media options.
+extern const char kLinuxMediaHelp[];
+
+// DefaultMkisofs: the first of genisoimage and xorrisofs found in PATH, or "".
+std::string DefaultMkisofs();
+
+// IsDirectory: `path` names a directory (an unpacked medium).
+bool IsDirectory(const std::string &path);
+
+// ScanMedium runs AutoInstall_ScanDisk for a directory, else
+// AutoInstall_ScanISO.
+bool ScanMedium(const std::string &medium, const std::string &outDir, const char *guestOS,
+                unsigned version, const std::string &isolinuxBin);
+
+// MakeLinuxMedia builds the medium for the answer file prepared in
+// `answerDir`: the floppy for guests that read it from one, else the boot
+// tree of `medium` (image or directory) with the answer file and tools,
+// mastered into mediaDir/autoinst.iso (the tree is staged in a temporary
+// directory inside mediaDir and removed). Appends the files made to
+// `out_files`; false on failure (the library's log lines say why).
+bool MakeLinuxMedia(const std::string &medium, const GuessResult &guess,
+                    const std::string &answerDir, const LinuxMediaOptions &o,
+                    std::vector<std::string> *out_files);
+
+// LogCapture collects the library's log lines while it lives (unless -v
+// shows them as they come).
+class LogCapture {
+ public:
+  LogCapture();
+  ~LogCapture();
+  LogCapture(const LogCapture &) = delete;
+  LogCapture &operator=(const LogCapture &) = delete;
+  const std::vector<std::string> &Lines() const { return lines_; }
+
+ private:
+  std::vector<std::string> lines_;
+  bool active_;
+};
+
+}  // namespace tvxcli
