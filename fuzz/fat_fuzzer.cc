@@ -6,7 +6,7 @@
 #include <string>
 #include <unistd.h>
 
-#include "platform/fat.h"
+#include "tvx_fat.h"
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
   if (size > 262144) return 0;

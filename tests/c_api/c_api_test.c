@@ -6,6 +6,7 @@
 #include <stdio.h>
 #include <stdlib.h>
 #include <string.h>
+#include <unistd.h>
 
 static int failures = 0;
 static const char *phase = "";
@@ -66,6 +67,40 @@ static void TestIni(void) {
   CHECK(!IniUtil_GetIniFileString(path, "Data", "AutoPartition", NULL, 8));
   remove(path);
   CHECK(!IniUtil_WriteIniFileString(path, "S", "K", "v", FALSE));
+}
+
+/* A fresh floppy: one file in through the transfer call, out again. */
+static void TestFloppy(void) {
+  char path[] = "/tmp/tvx_c_api_flp_XXXXXX";
+  char host[] = "/tmp/tvx_c_api_host_XXXXXX";
+  FATVolume *vol = NULL;
+  FATDirectory *root = NULL;
+  FILE *f;
+  int fd;
+  phase = "floppy";
+  CHECK(FATDevFileIO_Open(NULL) == NULL);
+  fd = mkstemp(path);
+  CHECK(fd >= 0);
+  if (fd >= 0) close(fd);
+  fd = mkstemp(host);
+  CHECK(fd >= 0);
+  if (fd < 0) return;
+  f = fdopen(fd, "w");
+  fputs("[Unattended]\n", f);
+  fclose(f);
+  CHECK(FAT_FormatVolume(FATDevFileIO_Open(path), FAT_FLOPPY_SIZE, 0, &vol) == FAT_OK);
+  CHECK(FAT_OpenRootDirectory(vol, &root) == FAT_OK);
+  CHECK(AddFileToFloppyImg(root, host, "winnt.sif"));
+  remove(host);
+  CHECK(GetFileFromFloppyImg(root, "WINNT.SIF", host));
+  CHECK(!GetFileFromFloppyImg(root, "absent", host));
+  CHECK(FAT_CloseDirectory(root) == FAT_OK);
+  CHECK(FAT_CloseVolume(vol) == FAT_OK);
+  f = fopen(host, "r");
+  CHECK(f != NULL);
+  if (f != NULL) fclose(f);
+  remove(host);
+  remove(path);
 }
 
 /* Support, limits and validation for a hand-made recognition result. */
@@ -160,6 +195,7 @@ int main(void) {
   TestIni();
   TestAutoInstall();
   TestWindowsAnswers();
+  TestFloppy();
   if (failures == 0) printf("c_api: all phases passed\n");
   return failures == 0 ? 0 : 1;
 }
