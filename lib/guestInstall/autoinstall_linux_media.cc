@@ -17,6 +17,8 @@
 #include "platform/log.h"
 #include "platform/process.h"
 #include "tvx_autoinstall_linux_media.h"
+#include "tvx_fat.h"
+#include "tvx_floppy.h"
 #include "platform/unique.h"
 
 namespace tvx::autoinstall {
@@ -34,6 +36,68 @@ constexpr const char *kToolsFiles[][2] = {
 // an option of the tool.
 std::string NotAnOption(const std::string &path) {
   return !path.empty() && path[0] == '-' ? "./" + path : path;
+}
+
+constexpr const char *kMakeFloppy = "AutoInstall_MakeFloppyImg_Linux";
+
+// OpenFloppyVolume gives the volume of the new autoinst.flp: a fresh image
+// for Ubuntu, a copy of the distribution's template floppy for the others.
+FATVolume *OpenFloppyVolume(AutoInstallLinuxKind kind, const char *templateDir,
+                            const std::string &image) {
+  FATVolume *volume = nullptr;
+  if (kind == AUTOINSTALL_LINUX_UBUNTU) {
+    if (FAT_FormatVolume(FATDevFileIO_Open(image.c_str()), FAT_FLOPPY_SIZE, 0, &volume) != 0) {
+      Log("%s: FAT_FormatVolume failed floppyImageFilePath=\"%s\"\n", kMakeFloppy, image.c_str());
+      return nullptr;
+    }
+    return volume;
+  }
+  tvx::CharPtr templatePath(File_PathJoin(
+      templateDir != nullptr ? templateDir : "",
+      kind == AUTOINSTALL_LINUX_MANDRIVA ? "mandriva.flp" : "suse.flp"));
+  if (templateDir == nullptr || !File_Exists(templatePath.get())) {
+    Log("%s: !File_Exists failed templatePath=\"%s\"\n", kMakeFloppy, templatePath.get());
+    return nullptr;
+  }
+  if (!CopyReplacing(templatePath.get(), image.c_str())) {
+    Log("%s: File_Copy failed templatePath=\"%s\" floppyImageFilePath=\"%s\"\n", kMakeFloppy,
+        templatePath.get(), image.c_str());
+    return nullptr;
+  }
+  if (FAT_OpenVolume(FATDevFileIO_Open(image.c_str()), &volume) != 0) {
+    Log("%s: FAT_OpenVolume failed floppyImageFilePath=\"%s\"\n", kMakeFloppy, image.c_str());
+    return nullptr;
+  }
+  return volume;
+}
+
+bool MakeFloppy(AutoInstallLinuxKind kind, const char *answerDir, const char *floppyDir,
+                const char *templateDir) {
+  const char *name = LinuxRow(kind)->answerFileName;
+  std::string answer = kind == AUTOINSTALL_LINUX_UBUNTU
+                           ? std::string(answerDir) + "/" + kUbuntuAnswerSubdir + "/" + name
+                           : std::string(answerDir) + "/" + name;
+  if (!File_Exists(answer.c_str())) return false;
+  tvx::CharPtr image(File_PathJoin(floppyDir, "autoinst.flp"));
+  FATVolume *volume = OpenFloppyVolume(kind, templateDir, image.get());
+  if (volume == nullptr) return false;
+  FATDirectory *root = nullptr;
+  bool ok = false;
+  unsigned long err = FAT_SkipVolumeBoot(volume);
+  if (err != 0) {
+    Log("%s: FAT_SkipVolumeBoot failed err=%ld\n", kMakeFloppy, static_cast<long>(err));
+  } else if ((err = FAT_OpenRootDirectory(volume, &root)) != 0) {
+    Log("%s: FAT_OpenRootDirectory failed err=%ld\n", kMakeFloppy, static_cast<long>(err));
+  } else if (!AddFileToFloppyImg(root, answer.c_str(), name)) {
+    Log("%s: AddFileToFloppyImg failed preseedFilePath=\"%s\"\n", kMakeFloppy, answer.c_str());
+  } else {
+    ok = true;
+  }
+  // The image reaches the disk when it is closed: a failed write-back is a
+  // floppy without its answer file.
+  ok = FAT_CloseDirectory(root) == 0 && ok;
+  ok = FAT_CloseVolume(volume) == 0 && ok;
+  return ok;
 }
 
 }  // namespace
@@ -72,10 +136,16 @@ TVX_EXPORT Bool AutoInstall_NeedsFloppy_Linux(const char *guestOS) {
   return LinuxRow(AutoInstallGetLinuxKind(guestOS))->needsFloppy ? TRUE : FALSE;
 }
 
-// TODO(floppy): the FAT layer is merged next.
 TVX_EXPORT Bool AutoInstall_MakeFloppyImg_Linux(const char *answerDir, const char *floppyDir,
                                                 const char *templateDir, const char *guestOS) {
-  return FALSE;
+  try {
+    AutoInstallLinuxKind kind = AutoInstallGetLinuxKind(guestOS);
+    if (kind == AUTOINSTALL_LINUX_NONE || kind == AUTOINSTALL_LINUX_REDHAT) return TRUE;
+    if (answerDir == nullptr || floppyDir == nullptr) return FALSE;
+    return MakeFloppy(kind, answerDir, floppyDir, templateDir) ? TRUE : FALSE;
+  } catch (...) {
+    return FALSE;
+  }
 }
 
 TVX_EXPORT Bool AutoInstall_AddTools_Linux(const char *destinationDir, const char *toolsDir) {
