@@ -187,6 +187,18 @@ static void TestGuess(void) {
   CHECK(Guess_ELF_Arch(elf, sizeof elf) == GUESS_ELF_ARCH_X86_64);
 }
 
+/* Linux install media: what needs a floppy, and calls that need no files. */
+static void TestLinuxMedia(void) {
+  phase = "linux media";
+  CHECK(AutoInstall_NeedsFloppy_Linux("ubuntu-64"));
+  CHECK(!AutoInstall_NeedsFloppy_Linux("centos7-64"));
+  CHECK(AutoInstall_MakeFloppyImg_Linux("/nonexistent", "/nonexistent", NULL, "centos7-64"));
+  CHECK(!AutoInstall_MasterISO("/nonexistent", NULL, "/nonexistent"));
+  CHECK(!AutoInstall_ScanDisk("/nonexistent", "/proc/nonexistent", "centos7-64", 0, NULL));
+  CHECK(!AutoInstall_ScanISO("/nonexistent", "/proc/nonexistent", NULL, 0, NULL));
+  CHECK(!AutoInstall_AddTools_Linux("/nonexistent", "/nonexistent"));
+}
+
 int main(void) {
   TestBase();
   TestGuess();
@@ -196,6 +208,7 @@ int main(void) {
   TestAutoInstall();
   TestWindowsAnswers();
   TestFloppy();
+  TestLinuxMedia();
   if (failures == 0) printf("c_api: all phases passed\n");
   return failures == 0 ? 0 : 1;
 }
