@@ -74,43 +74,62 @@ bool ScanMedium(const std::string &medium, const std::string &outDir, const char
                                                    version, bin);
 }
 
-bool MakeLinuxMedia(const std::string &medium, const GuessResult &guess,
-                    const std::string &answerDir, const LinuxMediaOptions &o,
-                    std::vector<std::string> *out_files) {
+namespace {
+
+// MakeBootCd stages the boot tree (answer file and tools included) inside
+// the media directory, on the same file system, and masters it into
+// autoinst.iso; the tree is gone afterwards either way.
+bool MakeBootCd(const std::string &medium, const GuessResult &guess,
+                const std::string &answerFile, const LinuxMediaOptions &o) {
   namespace fs = std::filesystem;
-  std::error_code ec;
-  fs::create_directories(o.mediaDir, ec);
-  if (AutoInstall_NeedsFloppy_Linux(guess.guestOS)) {
-    if (!AutoInstall_MakeFloppyImg_Linux(answerDir.c_str(), o.mediaDir.c_str(),
-                                         o.templateDir.c_str(), guess.guestOS)) {
-      return false;
-    }
-    out_files->push_back((fs::path(o.mediaDir) / "autoinst.flp").string());
-    return true;
-  }
   std::string mkisofs = o.mkisofs.empty() ? DefaultMkisofs() : o.mkisofs;
   if (mkisofs.empty()) {
     std::fprintf(stderr, "tvxguest: no ISO mastering tool found (genisoimage, xorrisofs)\n");
     return false;
   }
-  // The tree is mastered and removed again; staging it inside the media
-  // directory keeps it on the same file system and easy to find if the
-  // process dies half way.
-  std::string pattern = (fs::path(o.mediaDir) / ".autoinst-tree.XXXXXX").string();
-  if (::mkdtemp(pattern.data()) == nullptr) {
+  std::string tree = (fs::path(o.mediaDir) / ".autoinst-tree.XXXXXX").string();
+  if (::mkdtemp(tree.data()) == nullptr) {
     std::fprintf(stderr, "tvxguest: cannot create a directory in %s\n", o.mediaDir.c_str());
     return false;
   }
-  const std::string tree = pattern;
-  fs::copy_file(fs::path(answerDir) / "ks.cfg", fs::path(tree) / "ks.cfg", ec);
+  std::error_code ec;
+  if (!answerFile.empty()) fs::copy_file(answerFile, fs::path(tree) / "ks.cfg", ec);
   bool ok = !ec && ScanMedium(medium, tree, guess.guestOS, guess.version, o.isolinuxBin) &&
             (o.toolsDir.empty() || AutoInstall_AddTools_Linux(tree.c_str(), o.toolsDir.c_str()));
   if (!ok) {
     fs::remove_all(tree, ec);
     return false;
   }
-  if (!AutoInstall_MasterISO(tree.c_str(), mkisofs.c_str(), o.mediaDir.c_str())) return false;
-  out_files->push_back((fs::path(o.mediaDir) / "autoinst.iso").string());
+  return AutoInstall_MasterISO(tree.c_str(), mkisofs.c_str(), o.mediaDir.c_str());
+}
+
+}  // namespace
+
+bool MakeLinuxMedia(const std::string &medium, const GuessResult &guess,
+                    const std::string &answerDir, const LinuxMediaOptions &o,
+                    std::vector<std::string> *out_files, std::vector<std::string> *out_notes) {
+  namespace fs = std::filesystem;
+  std::error_code ec;
+  fs::create_directories(o.mediaDir, ec);
+  std::string iso = (fs::path(o.mediaDir) / "autoinst.iso").string();
+  if (!AutoInstall_NeedsFloppy_Linux(guess.guestOS)) {
+    if (!MakeBootCd(medium, guess, (fs::path(answerDir) / "ks.cfg").string(), o)) return false;
+    out_files->push_back(iso);
+    return true;
+  }
+  if (!AutoInstall_MakeFloppyImg_Linux(answerDir.c_str(), o.mediaDir.c_str(),
+                                       o.templateDir.c_str(), guess.guestOS)) {
+    return false;
+  }
+  out_files->push_back((fs::path(o.mediaDir) / "autoinst.flp").string());
+  // The floppy guest boots the same kind of CD, whose arguments send the
+  // installer to the floppy; without one the arguments are typed at the
+  // medium's own boot prompt.
+  if (MakeBootCd(medium, guess, "", o)) {
+    out_files->push_back(iso);
+  } else {
+    out_notes->push_back("no boot CD: the medium's isolinux boot tree could not be copied");
+  }
   return true;
 }
 

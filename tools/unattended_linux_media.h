@@ -38,15 +38,16 @@ bool IsDirectory(const std::string &path);
 bool ScanMedium(const std::string &medium, const std::string &outDir, const char *guestOS,
                 unsigned version, const std::string &isolinuxBin);
 
-// MakeLinuxMedia builds the medium for the answer file prepared in
-// `answerDir`: the floppy for guests that read it from one, else the boot
-// tree of `medium` (image or directory) with the answer file and tools,
-// mastered into mediaDir/autoinst.iso (the tree is staged in a temporary
-// directory inside mediaDir and removed). Appends the files made to
-// `out_files`; false on failure (the library's log lines say why).
+// MakeLinuxMedia builds the media for the answer file prepared in
+// `answerDir`, into mediaDir: for the Red Hat family the boot tree of
+// `medium` (image or directory) with ks.cfg and the tools, mastered into
+// autoinst.iso; for floppy guests autoinst.flp and, when the medium boots
+// through isolinux, an autoinst.iso whose arguments point at the floppy (its
+// absence is only a note). Appends the files made to `out_files`; false on
+// failure (the library's log lines say why).
 bool MakeLinuxMedia(const std::string &medium, const GuessResult &guess,
                     const std::string &answerDir, const LinuxMediaOptions &o,
-                    std::vector<std::string> *out_files);
+                    std::vector<std::string> *out_files, std::vector<std::string> *out_notes);
 
 // LogCapture collects the library's log lines while it lives (unless -v
 // shows them as they come).

@@ -9,6 +9,7 @@
 #                        ubuntu) that boots E2E_KERNEL and E2E_INITRD
 #   e2e_boot LOG ARGS... boots qemu with ARGS, the console to LOG; bounded
 #   e2e_expect LOG TEXT  fails, showing the log, unless LOG holds TEXT
+#   e2e_show LOG REGEX   prints the installer's matching lines
 e2e_here=$(cd "$(dirname "${BASH_SOURCE[0]}")" && pwd)
 
 # The modules a CD-ROM and a floppy need, in load order.
@@ -110,6 +111,12 @@ e2e_boot() {
   # reboot into an exit, the timeout bounds everything else.
   timeout 90 qemu-system-x86_64 -machine pc,accel=tcg -m 256 -nographic -no-reboot \
     -monitor none "$@" </dev/null >"$log" 2>&1 || true
+}
+
+# e2e_show LOG REGEX: the stand-in installer's lines (and the boot loader's
+# banner) that match, without the console's escape sequences.
+e2e_show() {
+  tr -d '\r' <"$1" | grep -oE '(e2e: |ISOLINUX ).*' | grep -E "$2" | sed 's/^/  /'
 }
 
 e2e_expect() {
