@@ -19,7 +19,6 @@ namespace {
 
 constexpr char kSaltPrefix[] = "$5$";
 constexpr char kRoundsPrefix[] = "rounds=";
-constexpr size_t kRoundsDefault = 5000;
 constexpr size_t kRoundsMin = 1000;
 constexpr size_t kRoundsMax = 999999999;
 constexpr size_t kSaltMax = 16;
@@ -32,17 +31,13 @@ constexpr char kB64[] = "./0123456789ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopq
 constexpr char kSaltAlphabet[] =
     "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789./";
 
-struct SaltSpec {
-  std::string_view salt;
-  size_t rounds = kRoundsDefault;
-  bool customRounds = false;
-};
+}  // namespace
 
-// ParseSalt reads the optional "$5$" and "rounds=N$" in front of the salt.
+// ParseCryptSalt reads the optional "$5$" and "rounds=N$" in front of the salt.
 // Only plain digits count as N (no sign, no blanks, at least one digit), so
 // "rounds=$" stays salt text rather than meaning zero rounds.
-SaltSpec ParseSalt(const char *salt) {
-  SaltSpec spec;
+CryptSalt ParseCryptSalt(const char *salt) {
+  CryptSalt spec;
   if (std::strncmp(salt, kSaltPrefix, sizeof kSaltPrefix - 1) == 0) salt += sizeof kSaltPrefix - 1;
   if (std::strncmp(salt, kRoundsPrefix, sizeof kRoundsPrefix - 1) == 0) {
     const char *num = salt + sizeof kRoundsPrefix - 1;
@@ -61,6 +56,8 @@ SaltSpec ParseSalt(const char *salt) {
   spec.salt = std::string_view(salt, len < kSaltMax ? len : kSaltMax);
   return spec;
 }
+
+namespace {
 
 // Wipe keeps key-derived bytes from outliving the call; the compiler may not
 // drop it as a dead store.
@@ -93,7 +90,7 @@ struct Work {
 
 // Crypt writes the full result (at most kResultMax characters, no NUL) into
 // `out` and returns its length.
-size_t Crypt(std::string_view key, const SaltSpec &spec, char out[kResultMax]) {
+size_t Crypt(std::string_view key, const CryptSalt &spec, char out[kResultMax]) {
   Work w;
   const std::string_view salt = spec.salt;
   const size_t klen = key.size();
@@ -211,7 +208,7 @@ extern "C" TVX_EXPORT char *SHA256_crypt(const char *key, const char *salt, char
       return nullptr;
     }
     char out[kResultMax];
-    size_t len = Crypt(std::string_view(key, klen), ParseSalt(salt), out);
+    size_t len = Crypt(std::string_view(key, klen), ParseCryptSalt(salt), out);
     // Whatever fits is written, the terminator only with the whole result.
     std::memcpy(buffer, out, len < room ? len : room);
     if (room <= len) return nullptr;

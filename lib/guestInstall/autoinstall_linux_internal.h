@@ -5,6 +5,7 @@
 
 #include <cstddef>
 #include <string>
+#include <string_view>
 
 #include "tvx_autoinstall.h"
 #include "tvx_autoinstall_linux.h"
@@ -36,6 +37,14 @@ inline constexpr char kUbuntuAnswerSubdir[] = "custom";
 // answer file of `kind` below `outputDir` ("" for kind 0):
 // outputDir/ks.cfg, outputDir/custom/preseed.cfg, ...
 std::string LinuxAnswerFilePath(AutoInstallLinuxKind kind, const char *outputDir);
+
+// The salt of a SHA256_crypt call with its rounds parameter taken apart.
+struct CryptSalt {
+  std::string_view salt;  // at most 16 characters, up to the first '$'
+  size_t rounds = 5000;
+  bool customRounds = false;  // "rounds=N$" was given (N then clamped)
+};
+CryptSalt ParseCryptSalt(const char *salt);
 
 // AutoInstallCryptLinuxPassword draws a 16-character salt and returns the
 // "$5$SALT$DIGEST" form of `password` in a static buffer that the next call

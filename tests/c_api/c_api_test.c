@@ -159,6 +159,31 @@ static void TestWindowsAnswers(void) {
   remove(dir);
 }
 
+/* The SHA-256 crypt and a Linux answer file. */
+static void TestLinuxAnswers(void) {
+  char dir[] = "/tmp/tvx_c_api_linux_XXXXXX";
+  char out[600], hash[128], small[8], b64[4];
+  char *cp = b64;
+  int left = 4;
+  phase = "linux answers";
+  CHECK(SHA256_crypt("Hello world!", "$5$saltstring", hash, (int)sizeof hash) == hash);
+  CHECK(strcmp(hash, "$5$saltstring$5B8vYYiY.CVt1RlTTf8KbXBH3hsxY/GNooZaBBGWEc5") == 0);
+  CHECK(SHA256_crypt("Hello world!", "$5$saltstring", small, (int)sizeof small) == NULL);
+  b64_from_24bit(0, 0, 1, 4, &left, &cp);
+  CHECK(left == 0 && memcmp(b64, "/...", 4) == 0);
+  if (mkdtemp(dir) == NULL) {
+    CHECK(!"temporary directory made");
+    return;
+  }
+  CHECK(AutoInstall_PrepareAnswerFileEx_Linux("centos7-64", GUESS_VERSION_CENTOS_7, dir, "jo",
+                                              "Jo Doe", "pw", "rootpw", NULL, FALSE, 0, FALSE));
+  snprintf(out, sizeof out, "%s/ks.cfg", dir);
+  CHECK(remove(out) == 0);
+  CHECK(!AutoInstall_PrepareAnswerFileEx_Linux("windows9-64", 0, dir, "jo", "Jo", "pw", "pw",
+                                               NULL, FALSE, 0, FALSE));
+  remove(dir);
+}
+
 static void TestIso9660(void) {
   phase = "iso9660";
   Iso9660Image *image = (Iso9660Image *)&image; /* must be cleared */
@@ -208,6 +233,7 @@ int main(void) {
   TestAutoInstall();
   TestWindowsAnswers();
   TestFloppy();
+  TestLinuxAnswers();
   TestLinuxMedia();
   if (failures == 0) printf("c_api: all phases passed\n");
   return failures == 0 ? 0 : 1;
