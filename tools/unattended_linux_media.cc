@@ -133,6 +133,21 @@ bool MakeLinuxMedia(const std::string &medium, const GuessResult &guess,
   return true;
 }
 
+bool ContinueWithMedia(const std::string &medium, const GuessResult &guess,
+                       const std::string &answerDir, const LinuxMediaOptions &o, bool json,
+                       std::vector<std::string> *files, std::vector<std::string> *log) {
+  if (o.mediaDir.empty()) return true;
+  std::vector<std::string> notes;
+  LogCapture capture;
+  bool ok = MakeLinuxMedia(medium, guess, answerDir, o, files, &notes);
+  log->insert(log->end(), capture.Lines().begin(), capture.Lines().end());
+  for (const std::string &note : notes) {
+    log->push_back("note: " + note);
+    if (!json) std::fprintf(stderr, "tvxguest: note: %s\n", note.c_str());
+  }
+  return ok;
+}
+
 namespace {
 void Capture(TvxLogLevel, const char *text, void *ctx) {
   std::string line = text;

@@ -49,6 +49,14 @@ bool MakeLinuxMedia(const std::string &medium, const GuessResult &guess,
                     const std::string &answerDir, const LinuxMediaOptions &o,
                     std::vector<std::string> *out_files, std::vector<std::string> *out_notes);
 
+// ContinueWithMedia is the `--media` step of `unattended linux`: nothing to
+// do without --media; else MakeLinuxMedia with the library's log lines
+// collected into `log` (notes go there too, and to standard error unless
+// `json`).
+bool ContinueWithMedia(const std::string &medium, const GuessResult &guess,
+                       const std::string &answerDir, const LinuxMediaOptions &o, bool json,
+                       std::vector<std::string> *files, std::vector<std::string> *log);
+
 // LogCapture collects the library's log lines while it lives (unless -v
 // shows them as they come).
 class LogCapture {

@@ -99,7 +99,7 @@ if "$tool" unattended linux --help >/dev/null 2>&1; then
   check "autoinst.iso boots from isolinux.bin (El Torito)" \
     sh -c 'isoinfo -d -i "$1" | grep -q "El Torito"' - "$media/autoinst.iso"
   check "ks.cfg at the root of autoinst.iso" \
-    sh -c 'isoinfo -i "$1" -x "/KS.CFG;1" | grep -q "rootpw --iscrypted \$5\$"' - "$media/autoinst.iso"
+    sh -c 'isoinfo -i "$1" -x "/KS.CFG;1" | grep -qF "rootpw --iscrypted \$5\$"' - "$media/autoinst.iso"
   check "the staging tree is gone" test -z "$(find "$media" -mindepth 1 -maxdepth 1 -name '.autoinst-tree*')"
   ubuiso=$tmp/ubu2004.iso
   mkdir -p "$tmp/u2004/.disk"
