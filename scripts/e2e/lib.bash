@@ -1,7 +1,8 @@
 # Sourced by scripts/e2e/run and the demo: the pieces of the boot test.
 # A real distribution kernel (Debian's, downloaded as a package and unpacked,
 # never installed) and a busybox RAM disk that stands in for an installer;
-# both are cached under the build tree, so only the first run downloads.
+# both are cached beside the build directories (BUILD_DIR/e2e-cache), so
+# only the first run downloads.
 #
 #   e2e_kernel CACHE     sets E2E_KERNEL (vmlinuz) and E2E_MODULES (module tree)
 #   e2e_initrd CACHE     sets E2E_INITRD (gzip'd cpio with /init and modules)
@@ -90,7 +91,10 @@ CFG
   case $kind in
     centos7)
       printf '1587474930.398424\nCentOS Linux 7\nx86_64\nALL\n' >"$dir/.discinfo"
-      printf -- '-----BEGIN PGP PUBLIC KEY BLOCK-----\nstand-in\n' >"$dir/RPM-GPG-KEY-CentOS-7" ;;
+      printf -- '-----BEGIN PGP PUBLIC KEY BLOCK-----\nstand-in\n' >"$dir/RPM-GPG-KEY-CentOS-7"
+      # A full DVD (not the minimal one) carries perl among its packages.
+      mkdir -p "$dir/Packages"
+      printf 'rpm stand-in' >"$dir/Packages/perl-5.16.3-294.el7_6.x86_64.rpm" ;;
     ubuntu)
       mkdir -p "$dir/.disk"
       printf 'Ubuntu 20.04.1 LTS "Focal Fossa" - Release amd64 (20200731)' >"$dir/.disk/info" ;;
