@@ -67,8 +67,9 @@ TVX_EXPORT Bool AutoInstall_NeedsFloppy_Linux(const char *guestOS);
  * for Ubuntu ("custom/preseed.cfg" of answerDir, stored as "preseed.cfg"); a
  * copy of `templateDir`/"suse.flp" or "mandriva.flp" for SUSE, SLES 10 and
  * Mandriva. TRUE at once, without an image, for guests that need no floppy.
- * FALSE when the answer file or the template is missing or a FAT step fails;
- * an image begun before the failure stays in floppyDir. */
+ * FALSE when the answer file or the template is missing or a FAT step fails,
+ * including writing the image back when it is closed; an image begun before
+ * the failure stays in floppyDir. */
 TVX_EXPORT Bool AutoInstall_MakeFloppyImg_Linux(const char *answerDir, const char *floppyDir,
                                                 const char *templateDir, const char *guestOS);
 
