@@ -17,6 +17,7 @@
 #include "tvx_guess.h"
 #include "tvx_log.h"
 #include "command_group.h"
+#include "floppy_cli.h"
 #include "unattended_common.h"
 
 namespace tvxcli {
@@ -47,12 +48,14 @@ void PrintHelp() {
       "  -h, --help            show this help\n\n"
       "Exit status: 0 written, 1 not recognised or not written, 2 IMAGE cannot be\n"
       "opened, 64 usage error. Templates ship in share/tvxguest/windows.\n");
+  std::fputs(WindowsFloppyOptions::Help(), stdout);
 }
 
 struct Options {
   std::string sif, xml, storePwd, imageName, fullName, password, productKey, language, out, image;
   bool haveStorePwd = false, havePassword = false, haveKey = false, haveLanguage = false;
   bool autoLogon = true, keepPartitions = false, json = false;
+  WindowsFloppyOptions floppy;
 };
 
 bool ReadFirstLine(const std::string &path, std::string *out) {
@@ -103,6 +106,10 @@ int Parse(const std::vector<std::string> &args, Options *o) {
       o->keepPartitions = true;
       continue;
     }
+    if (int r = o->floppy.Take(kName, args, &i); r != WindowsFloppyOptions::kNotMine) {
+      if (r >= 0) return r;
+      continue;
+    }
     if (a.size() > 1 && a[0] == '-') {
       bool known = false;
       for (const Valued &v : valued) {
@@ -135,6 +142,7 @@ int Parse(const std::vector<std::string> &args, Options *o) {
   for (const auto &[value, flag] : required) {
     if (value->empty()) return UsageError(kName, std::string(flag) + " is required");
   }
+  if (int r = o->floppy.Check(kName); r >= 0) return r;
   if (havePasswordFile) {
     if (o->havePassword) return UsageError(kName, "give --password or --password-file, not both");
     if (!ReadFirstLine(passwordFile, &o->password)) {
@@ -223,6 +231,7 @@ int Run(const std::vector<std::string> &args) {
       static_cast<GuessVersion>(guess.version), o.out.c_str(),
       o.haveLanguage ? o.language.c_str() : nullptr, o.imageName.c_str(), o.autoLogon,
       o.keepPartitions);
+  if (ok && o.floppy.wanted) ok = o.floppy.Make(o.out);
   if (!Verbose()) Tvx_SetLogSink(nullptr, nullptr);
 
   std::vector<std::string> files;
@@ -230,6 +239,7 @@ int Run(const std::vector<std::string> &args) {
     std::string path = (std::filesystem::path(o.out) / name).string();
     if (ok && (o.haveStorePwd || std::string(name) != "storePwd.ini")) files.push_back(path);
   }
+  if (o.floppy.wanted) files = ok ? o.floppy.Files(o.out) : std::vector<std::string>();
   const char *versionName =
       guess.version < GUESS_VERSION_DUMMY_LAST
           ? Guess_GetSubString(static_cast<GuessVersion>(guess.version))

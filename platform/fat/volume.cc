@@ -200,8 +200,11 @@ unsigned long FAT_FormatVolume(FATDevice *dev, uint64_t size, unsigned flags,
   v->Set(1, v->EndMark());
   // The finished image replaces the target in one rename; the descriptor
   // kept for write-back is the temporary file's, which becomes the image.
+  // Floppies carry answer files, some with passwords: owner-only.
+  FileReplaceOptions options;
+  options.secret = true;
   int kept = -1;
-  Bool ok = File_ReplaceWith(path.c_str(), FileReplaceOptions{}, [&](int fd, const char *) {
+  Bool ok = File_ReplaceWith(path.c_str(), options, [&](int fd, const char *) {
     if (!tvx::WriteAll(fd, v->image.data(), v->image.size())) return false;
     kept = ::dup(fd);
     return kept >= 0;

@@ -69,37 +69,25 @@ static void TestIni(void) {
   CHECK(!IniUtil_WriteIniFileString(path, "S", "K", "v", FALSE));
 }
 
-/* A fresh floppy: one file in through the transfer call, out again. */
+/* A fresh floppy: the transfer calls and the Windows floppy calls. */
 static void TestFloppy(void) {
   char path[] = "/tmp/tvx_c_api_flp_XXXXXX";
-  char host[] = "/tmp/tvx_c_api_host_XXXXXX";
   FATVolume *vol = NULL;
   FATDirectory *root = NULL;
-  FILE *f;
-  int fd;
+  int fd = mkstemp(path);
   phase = "floppy";
-  CHECK(FATDevFileIO_Open(NULL) == NULL);
-  fd = mkstemp(path);
-  CHECK(fd >= 0);
-  if (fd >= 0) close(fd);
-  fd = mkstemp(host);
   CHECK(fd >= 0);
   if (fd < 0) return;
-  f = fdopen(fd, "w");
-  fputs("[Unattended]\n", f);
-  fclose(f);
+  close(fd);
   CHECK(FAT_FormatVolume(FATDevFileIO_Open(path), FAT_FLOPPY_SIZE, 0, &vol) == FAT_OK);
   CHECK(FAT_OpenRootDirectory(vol, &root) == FAT_OK);
-  CHECK(AddFileToFloppyImg(root, host, "winnt.sif"));
-  remove(host);
-  CHECK(GetFileFromFloppyImg(root, "WINNT.SIF", host));
-  CHECK(!GetFileFromFloppyImg(root, "absent", host));
-  CHECK(FAT_CloseDirectory(root) == FAT_OK);
-  CHECK(FAT_CloseVolume(vol) == FAT_OK);
-  f = fopen(host, "r");
-  CHECK(f != NULL);
-  if (f != NULL) fclose(f);
-  remove(host);
+  CHECK(AddFileToFloppyImg(root, "/dev/null", "empty.txt"));
+  CHECK(GetFileFromFloppyImg(root, "EMPTY.TXT", "/dev/null"));
+  CHECK(!GetFileFromFloppyImg(root, "absent", "/dev/null"));
+  CHECK(FAT_CloseDirectory(root) == FAT_OK && FAT_CloseVolume(vol) == FAT_OK);
+  CHECK(!AutoInstall_MakeFloppyImg(NULL, "/tmp", NULL, NULL, NULL, NULL));
+  CHECK(!AutoInstall_AddFileToFloppyImg(path, "x.txt", "/nonexistent/tvx-config"));
+  WriteOEMDriverInfo("/nonexistent/txtsetup.oem", "/nonexistent/winnt.sif");
   remove(path);
 }
 

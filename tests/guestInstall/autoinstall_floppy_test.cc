@@ -20,53 +20,41 @@ using tvxtest::TempDir;
 using tvxtest::TestFloppy;
 using tvxtest::WriteFileOrDie;
 
-// Sizes around the 512-byte block and the cluster, and several clusters.
+// Sizes around the 512-byte block and the cluster, several clusters; short,
+// mixed-case, long and non-ASCII names; a file replaced by a shorter one.
 TEST(FloppyTransfer, FilesGoInAndComeOutByteForByte) {
-  const size_t sizes[] = {0, 1, 511, 512, 513, 1024, 5000, 300000};
+  std::pair<std::string, size_t> files[] = {
+      {"empty", 0},          {"f1.bin", 1},           {"TXTSETUP.OEM", 511},
+      {"storePwd.ini", 512}, {"auto_i~1.cfg", 513},   {"Ünïcode name.txt", 5000},
+      {std::string(200, 'L') + ".long", 1024},        {"TarvexToolsUpgrader.exe", 300000},
+  };
   TempDir t;
-  std::string img = t.Join("autoinst.flp");
+  std::string img = t.Join("autoinst.flp"), host = t.Join("host"), back = t.Join("back");
   TestFloppy f;
   ASSERT_EQ(f.Open(img, true), FAT_OK);
   std::set<std::string> names;
-  for (size_t n : sizes) {
-    std::string name = "f" + std::to_string(n) + ".bin", host = t.Join(name);
+  for (const auto &[name, n] : files) {
     WriteFileOrDie(host, Bytes(n, static_cast<int>(n)));
-    ASSERT_TRUE(AddFileToFloppyImg(f.root, host.c_str(), name.c_str())) << n;
+    ASSERT_TRUE(AddFileToFloppyImg(f.root, host.c_str(), name.c_str())) << name;
     names.insert(name);
   }
-  for (size_t n : sizes) {
-    std::string name = "f" + std::to_string(n) + ".bin", back = t.Join("back");
-    ASSERT_TRUE(GetFileFromFloppyImg(f.root, name.c_str(), back.c_str())) << n;
-    EXPECT_TRUE(ReadFileOrDie(back) == Bytes(n, static_cast<int>(n))) << n;
+  // The entry stays, with its name, and the old contents leave no tail.
+  files[7].second = 700;
+  WriteFileOrDie(host, Bytes(700, 700));
+  ASSERT_TRUE(AddFileToFloppyImg(f.root, host.c_str(), "tarvextoolsupgrader.EXE"));
+  for (const auto &[name, n] : files) {
+    ASSERT_TRUE(GetFileFromFloppyImg(f.root, name.c_str(), back.c_str())) << name;
+    EXPECT_TRUE(ReadFileOrDie(back) == Bytes(n, static_cast<int>(n))) << name;
   }
   f.Close();
+  EXPECT_EQ(ReadFileOrDie(img).size(), FAT_FLOPPY_SIZE);
   EXPECT_EQ(FatProblems(img), "");
   EXPECT_EQ(MtoolsNames(img), names);
-  for (size_t n : sizes) {
+  for (const auto &[name, n] : files) {
     std::string out;
-    ASSERT_TRUE(MtoolsRead(img, "f" + std::to_string(n) + ".bin", &out)) << n;
-    EXPECT_TRUE(out == Bytes(n, static_cast<int>(n))) << n;
+    ASSERT_TRUE(MtoolsRead(img, name, &out)) << name;
+    EXPECT_TRUE(out == Bytes(n, static_cast<int>(n))) << name;
   }
-}
-
-TEST(FloppyTransfer, ReplacingALongerFileLeavesNoTail) {
-  TempDir t;
-  std::string img = t.Join("autoinst.flp"), longer = t.Join("long"), shorter = t.Join("short");
-  WriteFileOrDie(longer, Bytes(20000, 1));
-  WriteFileOrDie(shorter, Bytes(700, 2));
-  TestFloppy f;
-  ASSERT_EQ(f.Open(img, true), FAT_OK);
-  ASSERT_TRUE(AddFileToFloppyImg(f.root, longer.c_str(), "winnt.sif"));
-  ASSERT_TRUE(AddFileToFloppyImg(f.root, shorter.c_str(), "WINNT.SIF"));  // same file
-  uint64_t free = 0;
-  FAT_GetFreeBytes(f.vol, &free);
-  EXPECT_EQ(free, (2847u - 2) * 512);  // the 20000 bytes' clusters came back
-  f.Close();
-  EXPECT_EQ(FatProblems(img), "");
-  EXPECT_EQ(MtoolsNames(img), std::set<std::string>{"winnt.sif"});
-  std::string out;
-  ASSERT_TRUE(MtoolsRead(img, "winnt.sif", &out));
-  EXPECT_TRUE(out == Bytes(700, 2));
 }
 
 TEST(FloppyTransfer, FailuresAreLoggedAndLeaveWhatWasCopied) {

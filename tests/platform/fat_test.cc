@@ -47,67 +47,6 @@ std::string Read(FATDirectory *root, const std::string &name, unsigned long *rc)
   return out;
 }
 
-std::set<std::string> List(FATDirectory *root) {
-  std::set<std::string> names;
-  FATDirIter *it = nullptr;
-  FAT_GetDirIter(root, &it);
-  while (FAT_DirIterNext(it) == FAT_OK) {
-    char *n = nullptr;
-    FAT_DirIterGetName(it, &n);
-    names.insert(std::string(n) + (FAT_DirIterIsDir(it) ? "/" : ""));
-    std::free(n);
-  }
-  return names;
-}
-
-const std::vector<std::pair<std::string, std::string>> kFiles = {
-    {"preseed.cfg", Bytes(1500, 1)},
-    {"TXTSETUP.OEM", Bytes(512, 2)},
-    {"storePwd.ini", Bytes(0, 3)},
-    {"TarvexToolsUpgrader.exe", Bytes(100000, 4)},
-    {"auto_i~1.cfg", Bytes(1, 5)},
-    {"Ünïcode name.txt", Bytes(700, 6)},
-    {std::string(200, 'L') + ".long", Bytes(513, 7)},
-};
-
-TEST(FAT, FormattedFloppyWithFilesPassesFsckAndMtoolsReadsThem) {
-  TempDir t;
-  std::string img = t.Join("autoinst.flp");
-  {
-    TestFloppy f;
-    ASSERT_EQ(f.Open(img, true), FAT_OK);
-    for (const auto &[name, data] : kFiles) ASSERT_EQ(Add(f.root, name, data), FAT_OK) << name;
-  }
-  EXPECT_EQ(ReadFileOrDie(img).size(), FAT_FLOPPY_SIZE);
-  EXPECT_EQ(FatProblems(img), "");
-  std::set<std::string> want;
-  for (const auto &[name, data] : kFiles) {
-    want.insert(name);
-    std::string out;
-    ASSERT_TRUE(MtoolsRead(img, name, &out)) << name;
-    EXPECT_TRUE(out == data) << name;
-  }
-  EXPECT_EQ(MtoolsNames(img), want);
-}
-
-TEST(FAT, ReadsFloppiesThatOtherToolsWrote) {
-  TempDir t;
-  std::string img = t.Join("tvxscsi.flp"), out;
-  ASSERT_EQ(tvxtest::RunArgv({"mkfs.fat", "-C", img, "1440"}, &out), 0) << out;
-  ASSERT_TRUE(tvxtest::MtoolsWrite(img, "A Long Driver Name.sys", Bytes(3000, 7)));
-  ASSERT_TRUE(tvxtest::MtoolsWrite(img, "OEMSETUP.INF", Bytes(10, 8)));
-  ASSERT_EQ(tvxtest::RunArgv({"mmd", "-i", img, "::/SUBDIR"}, &out), 0) << out;
-  TestFloppy f;
-  ASSERT_EQ(f.Open(img, false), FAT_OK);
-  EXPECT_EQ(List(f.root), (std::set<std::string>{"A Long Driver Name.sys", "OEMSETUP.INF", "SUBDIR/"}));
-  unsigned long rc;
-  EXPECT_EQ(Read(f.root, "a long driver name.SYS", &rc), Bytes(3000, 7));
-  EXPECT_EQ(rc, FAT_OK);
-  EXPECT_EQ(Read(f.root, "oemsetup.inf", &rc), Bytes(10, 8));
-  Read(f.root, "SUBDIR", &rc);
-  EXPECT_EQ(rc, FAT_ERR_NOT_FOUND);  // a directory is not a file
-}
-
 // Growing, shrinking, deleting and a full volume, checked by fsck.fat after
 // each round so that no cluster is lost or shared.
 TEST(FAT, FilesGrowShrinkAndFillTheVolume) {

@@ -10,8 +10,8 @@
 
 namespace tvxtest {
 
-// RunArgv runs argv[0] (searched in PATH) with standard output and error
-// captured into `out`; returns its exit status, -1 when it could not run.
+// RunArgv runs argv (searched in PATH), stdout and stderr into `out`: the
+// exit status, -1 when it could not run.
 int RunArgv(const std::vector<std::string> &argv, std::string *out);
 
 // FatProblems returns "" when `fsck.fat -n` finds the image clean, else its
@@ -19,18 +19,14 @@ int RunArgv(const std::vector<std::string> &argv, std::string *out);
 // so its words are read too.
 std::string FatProblems(const std::string &image);
 
-// MtoolsNames lists the root directory's entries as mdir shows them (long
-// names where there are), directories with a trailing "/".
+// MtoolsNames: the root directory's names as mdir shows them.
 std::set<std::string> MtoolsNames(const std::string &image);
 
-// MtoolsRead copies one root file out with mcopy; false when mcopy fails.
+// MtoolsRead / MtoolsWrite copy one root file out or in with mcopy.
 bool MtoolsRead(const std::string &image, const std::string &name, std::string *data);
-
-// MtoolsWrite copies `data` into the image's root as `name` with mcopy.
 bool MtoolsWrite(const std::string &image, const std::string &name, const std::string &data);
 
-// TestFloppy holds a volume and its root directory: a new 1.44 MB floppy or
-// an existing image. Close (or the destructor) writes it back.
+// TestFloppy: a new 1.44 MB floppy or an existing image, with its root.
 struct TestFloppy {
   FATVolume *vol = nullptr;
   FATDirectory *root = nullptr;
