@@ -74,9 +74,13 @@ bool ValidFullName(const char *text, const char **out_why) {
     }
     const uint32_t kMin[] = {0, 0x80, 0x800, 0x10000};
     ok = ok && cp >= kMin[n] && cp <= 0x10ffff && !(cp >= 0xd800 && cp <= 0xdfff) &&
-         cp != 0xfffe && cp != 0xffff && !(cp >= 0x80 && cp <= 0x9f);
+         cp != 0xfffe && cp != 0xffff;
     if (!ok) {
       *out_why = "is not valid UTF-8 text";
+      return false;
+    }
+    if (cp <= 0x9f) {
+      *out_why = "holds a control character";
       return false;
     }
     i += n + 1;
@@ -199,8 +203,9 @@ bool Prepare(const char *guestOS, uint32_t version, const char *outputDir, const
   guess.guestOS = guestOS;
   if (AutoInstallValidateLinuxText(&guess, userName, AUTOINSTALL_TEXT_SHORT_NAME, nullptr) !=
       AUTOINSTALL_TEXT_OK) {
-    Log("%s: the user name \"%s\" is refused: only a-z, 0-9 and '-' are allowed%s\n", kFn,
-        userName, kind == AUTOINSTALL_LINUX_UBUNTU ? ", and it must begin with a letter" : "");
+    // The name itself is not logged: it may hold anything, line breaks too.
+    Log("%s: the user name is refused: only a-z, 0-9 and '-' are allowed%s\n", kFn,
+        kind == AUTOINSTALL_LINUX_UBUNTU ? ", and it must begin with a letter" : "");
     return false;
   }
   const char *why = nullptr;

@@ -1,6 +1,5 @@
 #include "lib/guestInstall/autoinstall_sha256.h"
 
-#ifndef TVX_CRYPT_PLATFORM_SHA
 #include "platform/log.h"
 
 namespace tvx::autoinstall {
@@ -38,4 +37,3 @@ void Sha256::Final(uint8_t digest[32]) {
 }
 
 }  // namespace tvx::autoinstall
-#endif

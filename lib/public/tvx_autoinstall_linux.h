@@ -69,7 +69,8 @@ TVX_EXPORT void b64_from_24bit(unsigned char B2, unsigned char B1, unsigned char
  *  - powerOff: power the guest off after the install instead of rebooting.
  *  - reserved: not read. nvmeDisk: the guest's disk is NVMe (Ubuntu only).
  * For the Red Hat family the boot argument that points the installer at
- * ks.cfg is stored for the medium builders that run next.
+ * ks.cfg is stored for the medium builders that run next (process-wide, and
+ * only when the file was written).
  * Returns TRUE when the whole file was written.
  *
  * How typed texts are kept inert (no typed text ever runs as code in the
@@ -77,7 +78,8 @@ TVX_EXPORT void b64_from_24bit(unsigned char B2, unsigned char B1, unsigned char
  *  a. userName must satisfy the guest's short-name rule
  *     (AutoInstallValidateLinuxText, AUTOINSTALL_TEXT_SHORT_NAME: 'a'-'z',
  *     '0'-'9', '-'; Ubuntu: a letter first), else the call is refused.
- *  b. fullName must be valid UTF-8 without control characters and must not
+ *  b. fullName must be valid UTF-8 without control characters (C0, DEL, C1)
+ *     and without U+FFFE/U+FFFF (XML cannot carry them), and must not
  *     end in a backslash (which would join the next preseed line), else
  *     refused. Everything else is kept intact and escaped for where it lands:
  *     in the kickstart's `chfn -f "..."` shell line \ " $ ` get a backslash;
