@@ -271,6 +271,18 @@ static void TestToolsImage(void) {
   CHECK(!ToolsISO_GetImageInfo(NULL, &imageInfo));
 }
 
+/* Linux install media: what needs a floppy, and calls that need no files. */
+static void TestLinuxMedia(void) {
+  phase = "linux media";
+  CHECK(AutoInstall_NeedsFloppy_Linux("ubuntu-64"));
+  CHECK(!AutoInstall_NeedsFloppy_Linux("centos7-64"));
+  CHECK(AutoInstall_MakeFloppyImg_Linux("/nonexistent", "/nonexistent", NULL, "centos7-64"));
+  CHECK(!AutoInstall_MasterISO("/nonexistent", NULL, "/nonexistent"));
+  CHECK(!AutoInstall_ScanDisk("/nonexistent", "/proc/nonexistent", "centos7-64", 0, NULL));
+  CHECK(!AutoInstall_ScanISO("/nonexistent", "/proc/nonexistent", NULL, 0, NULL));
+  CHECK(!AutoInstall_AddTools_Linux("/nonexistent", "/nonexistent"));
+}
+
 int main(void) {
   TestBase();
   TestGuess();
@@ -284,6 +296,7 @@ int main(void) {
   TestFloppy();
   TestLinuxAnswers();
   TestToolsImage();
+  TestLinuxMedia();
   if (failures == 0) printf("c_api: all phases passed\n");
   return failures == 0 ? 0 : 1;
 }
