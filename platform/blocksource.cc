@@ -97,11 +97,17 @@ class MemSource final : public BlockSource {
 
 BlockSourcePtr OpenFileSource(const char *path) {
   if (path == nullptr) return nullptr;
-  int fd = ::open(path, O_RDONLY | O_CLOEXEC);
+  // Opening a FIFO blocks until a writer comes: open without waiting and
+  // take only what can hold an image, then read in the ordinary blocking way.
+  int fd = ::open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK);
   if (fd < 0) return nullptr;
-  struct stat st;
-  if (::fstat(fd, &st) != 0 || S_ISDIR(st.st_mode)) {
+  struct stat st {};
+  int flags = -1;
+  if (::fstat(fd, &st) != 0 || !(S_ISREG(st.st_mode) || S_ISBLK(st.st_mode)) ||
+      (flags = ::fcntl(fd, F_GETFL)) < 0 || ::fcntl(fd, F_SETFL, flags & ~O_NONBLOCK) != 0) {
+    int err = S_ISREG(st.st_mode) || S_ISBLK(st.st_mode) ? errno : EINVAL;
     ::close(fd);
+    errno = err;
     return nullptr;
   }
   uint64_t size = static_cast<uint64_t>(st.st_size);
