@@ -1,0 +1,107 @@
+#!/usr/bin/env bash
+# tvxguest unattended linux and tvxguest crypt: answer files for recognised
+# Linux media read back by their own parsers, passwords checked with the
+# crypt command and openssl, hostile texts run through the shell, and
+# failing calls that leave nothing behind.
+set -uo pipefail
+tool=${TVX_TOOL:?} media=${TVX_MEDIA_DIR:?}
+fail=0
+check() {  # check WHAT COND...
+  local what=$1; shift
+  if "$@"; then echo "ok: $what"; else echo "FAIL: $what"; fail=1; fi
+}
+if ! "$tool" unattended linux --help >/dev/null 2>&1; then
+  echo "skip: this tool has no 'unattended linux' command"
+  exit 0
+fi
+tmp=$(mktemp -d)
+trap 'rm -rf "$tmp"' EXIT
+name='Jo "JJ" O'"'"'Neil & Co <x> Zoë 王'
+password='$(touch x)`touch x`'
+root_password='r00t ${HOME} @ARGV'
+usable() { [ -e "$1" ] && "$tool" detect "$1" >/dev/null 2>&1; }
+answers() {  # answers OUTDIR IMAGE EXTRA...
+  local out=$1 img=$2; shift 2
+  "$tool" unattended linux --user jo --full-name "$name" --password "$password" \
+    --root-password "$root_password" --out "$out" "$@" "$img"
+}
+verifies() {  # verifies PASSWORD HASH
+  "$tool" crypt --check "$2" -- "$1" >/dev/null
+}
+
+centos=$media/redhat/centos7.iso
+if usable "$centos"; then
+  answers "$tmp/rh/new" "$centos" --power-off >"$tmp/out" 2>"$tmp/err"
+  check "centos7: exit 0" test $? -eq 0
+  ks=$tmp/rh/new/ks.cfg
+  check "centos7: names ks.cfg" grep -qx "wrote $ks" "$tmp/out"
+  check "centos7: owner-only file" test "$(stat -c %a "$ks")" = 600
+  check "centos7: root password verifies" \
+    verifies "$root_password" "$(sed -n 's/^rootpw --iscrypted //p' "$ks")"
+  check "centos7: user password verifies" \
+    verifies "$password" "$(sed -n "s/^\/usr\/sbin\/usermod -p '\([^']*\)'.*/\1/p" "$ks")"
+  sed -n '/^%post$/,/^%end$/p' "$ks" | sed '1d;$d' >"$tmp/post.sh"
+  check "centos7: %post passes sh -n" sh -n "$tmp/post.sh"
+  chfn=$(sed -n 's|^/usr/bin/chfn ||p' "$ks")
+  got=$(cd "$tmp" && sh -c "chfn() { printf '%s' \"\$2\"; }; chfn $chfn")
+  check "centos7: full name intact through the shell" test "$got" = "$name"
+  check "centos7: nothing ran" test ! -e "$tmp/x"
+  check "centos7: poweroff" grep -qx poweroff "$ks"
+fi
+
+ubuntu=$media/debian/ubu-2004.iso
+if usable "$ubuntu"; then
+  answers "$tmp/ub" "$ubuntu" --nvme --json >"$tmp/json" 2>&1
+  check "ubuntu --json: exit 0" test $? -eq 0
+  check "ubuntu --json: the preseed file" /usr/bin/python3 -c '
+import json, sys
+o = json.load(open(sys.argv[1]))
+assert o["result"] is True and o["files"] == [sys.argv[2]], o' "$tmp/json" "$tmp/ub/custom/preseed.cfg"
+  ps=$tmp/ub/custom/preseed.cfg
+  check "ubuntu: debconf reads the file" debconf-set-selections -c "$ps"
+  check "ubuntu: full name as typed" \
+    grep -qxF "ubiquity   passwd/user-fullname string   $name" "$ps"
+  check "ubuntu: NVMe disk" grep -qx 'ubiquity   partman-auto/disk string   /dev/nvme0n1' "$ps"
+  check "ubuntu: password verifies" \
+    verifies "$password" "$(sed -n 's/^ubiquity   passwd\/user-password-crypted password //p' "$ps")"
+fi
+
+sles=$media/suse/sles11.iso
+if usable "$sles"; then
+  answers "$tmp/su" "$sles" >/dev/null 2>&1
+  xml=$tmp/su/autoinst.xml
+  check "sles11: xmllint accepts the profile" xmllint --noout "$xml"
+  check "sles11: forename intact" \
+    test "$(xmllint --xpath "string(//*[local-name()='forename'])" "$xml")" = "$name"
+  check "sles11: root password verifies" verifies "$root_password" \
+    "$(xmllint --xpath "string((//*[local-name()='user_password'])[1])" "$xml")"
+fi
+
+# Failures: no answer file for Debian, a refused user name; nothing is left,
+# not even the staging directory beside --out.
+debian=$media/debian/deb11-amd64.iso
+if usable "$debian"; then
+  answers "$tmp/f/deb" "$debian" >/dev/null 2>"$tmp/err"
+  check "debian: exit 1" test $? -eq 1
+  check "debian: says why" grep -q 'no Linux answer file is made for debian11-64' "$tmp/err"
+fi
+if usable "$centos"; then
+  "$tool" unattended linux --user 'Jo;reboot' --full-name x --password p --out "$tmp/f/rh" \
+    "$centos" >/dev/null 2>"$tmp/err"
+  check "bad user: exit 1" test $? -eq 1
+  check "bad user: the library's reason" grep -q 'the user name is refused' "$tmp/err"
+fi
+check "failures leave nothing" test ! -e "$tmp/f"
+check "no staging directory left" test -z "$(find "$tmp" -name '.tvxguest-stage-*')"
+"$tool" unattended linux --full-name x --password p --out "$tmp/u" "$centos" >/dev/null 2>&1
+check "missing --user: exit 64" test $? -eq 64
+
+# crypt: a published vector, and a random salt cross-checked with openssl.
+check "crypt: published vector" test "$("$tool" crypt --salt '$5$saltstring' 'Hello world!')" = \
+  '$5$saltstring$5B8vYYiY.CVt1RlTTf8KbXBH3hsxY/GNooZaBBGWEc5'
+hash=$(printf '%s\n' "$password" | "$tool" crypt --stdin)
+salt=$(printf '%s' "$hash" | cut -d'$' -f3)
+check "crypt: openssl agrees" test "$(openssl passwd -5 -salt "$salt" "$password")" = "$hash"
+"$tool" crypt --check "$hash" wrong >/dev/null
+check "crypt: a wrong password does not match (exit 1)" test $? -eq 1
+exit $fail

@@ -1,0 +1,200 @@
+// SHA-256 crypt against the scheme's published vectors, the system's
+// crypt(3) and the openssl CLI; the buffer contract at every length; salt
+// and rounds parsing; the answer-file password helper.
+#include <gtest/gtest.h>
+
+#include <cstdio>
+#include <cstring>
+#include <ctime>
+#include <random>
+#include <string>
+#include <vector>
+
+#include "lib/guestInstall/autoinstall_linux_internal.h"
+#include "support/log_capture.h"
+#include "support/system_crypt.h"
+#include "tvx_autoinstall_linux.h"
+
+namespace {
+
+using tvx::autoinstall::AutoInstallCryptLinuxPassword;
+using tvx::autoinstall::ParseCryptSalt;
+
+std::string Crypt(const std::string &key, const std::string &salt) {
+  char buf[128];
+  const char *r = SHA256_crypt(key.c_str(), salt.c_str(), buf, sizeof buf);
+  return r != nullptr ? r : "(null)";
+}
+
+TEST(Sha256Crypt, PublishedVectors) {
+  const struct {
+    const char *salt, *key, *want;
+  } kVectors[] = {
+      {"$5$saltstring", "Hello world!",
+       "$5$saltstring$5B8vYYiY.CVt1RlTTf8KbXBH3hsxY/GNooZaBBGWEc5"},
+      {"$5$rounds=10000$saltstringsaltstring", "Hello world!",
+       "$5$rounds=10000$saltstringsaltst$3xv.VbSHBb41AL9AvLeujZkZRBAwqFMz2.opqey6IcA"},
+      {"$5$rounds=5000$toolongsaltstring", "This is just a test",
+       "$5$rounds=5000$toolongsaltstrin$Un/5jzAHMgOGZ5.mWJpuVolil07guHPvOW8mGRcvxa5"},
+      {"$5$rounds=1400$anotherlongsaltstring",
+       "a very much longer text to encrypt.  This one even stretches over morethan one line.",
+       "$5$rounds=1400$anotherlongsalts$Rx.j8H.h8HjEDGomFU8bDkXm3XIUnzyxf12oP84Bnq1"},
+      {"$5$rounds=77777$short", "we have a short salt string but not a short password",
+       "$5$rounds=77777$short$JiO1O3ZpDAxGJeaDIuqCoEFysAe1mZNJRs3pw0KQRd/"},
+      {"$5$rounds=123456$asaltof16chars..", "a short string",
+       "$5$rounds=123456$asaltof16chars..$gP3VQ/6X7UUEW3HkBn2w1/Ptq2jxPyzV/cZKmF/wJvD"},
+      {"$5$rounds=10$roundstoolow", "the minimum number is still observed",
+       "$5$rounds=1000$roundstoolow$yfvwcWrQ8l/K0DAWyuPMDNHpIVlTQebY9l/gL972bIC"},
+  };
+  for (const auto &v : kVectors) EXPECT_EQ(Crypt(v.key, v.salt), v.want) << v.salt;
+}
+
+// Random keys of every length the answer files allow and more (arbitrary
+// non-NUL bytes) and random salts of 0 to 20 characters, checked against
+// libxcrypt, which reads the same setting text.
+TEST(Sha256Crypt, AgreesWithSystemCrypt) {
+  ASSERT_NE(tvxtest::SystemCrypt("x", "$5$ab"), "") << "libcrypt.so.1 not usable";
+  std::mt19937 rng(20261123);
+  const std::string alphabet =
+      "./0123456789ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz";
+  for (int i = 0; i < 300; ++i) {
+    std::string key(rng() % 257, '\0');
+    for (char &c : key) c = static_cast<char>(1 + rng() % 255);
+    std::string salt(rng() % 21, '\0');
+    for (char &c : salt) c = alphabet[rng() % alphabet.size()];
+    // Few rounds keep the loop short; every tenth case uses the default.
+    std::string setting = i % 10 == 0 ? "$5$" + salt
+                                     : "$5$rounds=" + std::to_string(1000 + rng() % 100) + "$" + salt;
+    ASSERT_EQ(Crypt(key, setting), tvxtest::SystemCrypt(key, setting))
+        << "case " << i << " key length " << key.size() << " setting " << setting;
+  }
+}
+
+// Below 1000 rounds the system crypt refuses where this scheme clamps; the
+// openssl CLI clamps too. One run hashes many keys with one salt.
+TEST(Sha256Crypt, ClampedRoundsAgreeWithOpenssl) {
+  // (The CLI reads no empty key from a line and takes no empty salt.)
+  const char *salts[] = {"rounds=1$x", "rounds=999$abcdefghijklmnopq", "rounds=0$z"};
+  std::vector<std::string> keys = {"a", "$(touch x)", "pass word with spaces",
+                                   std::string(100, 'k'), "\xc3\xa9t\xc3\xa9"};
+  tvxtest::TempDir dir;
+  const std::string outPath = dir.Path() + "/openssl.txt";
+  for (const char *salt : salts) {
+    std::string cmd = std::string("openssl passwd -5 -stdin -salt '") + salt + "'";
+    FILE *p = popen((cmd + " > " + outPath).c_str(), "w");
+    ASSERT_NE(p, nullptr);
+    for (const auto &k : keys) std::fprintf(p, "%s\n", k.c_str());
+    ASSERT_EQ(pclose(p), 0) << cmd;
+    FILE *in = std::fopen(outPath.c_str(), "r");
+    ASSERT_NE(in, nullptr);
+    char line[256];
+    for (const auto &k : keys) {
+      ASSERT_NE(std::fgets(line, sizeof line, in), nullptr);
+      line[std::strcspn(line, "\n")] = '\0';
+      EXPECT_EQ(Crypt(k, salt), line) << salt << " key " << k;
+    }
+    std::fclose(in);
+  }
+}
+
+// Every buffer length around the result, for a result with and without a
+// rounds field: nothing at or past buffer[buflen], the prefix that fits, and
+// a terminated result only with room for the NUL.
+TEST(Sha256Crypt, BufferLengthContract) {
+  for (const char *salt : {"$5$rounds=1234$saltsalt", "$5$saltsalt"}) {
+    const std::string full = Crypt("secret", salt);
+    const int len = static_cast<int>(full.size());
+    for (int buflen = -1; buflen <= len + 2; ++buflen) {
+      std::vector<char> buf(len + 8, '#');
+      char *r = SHA256_crypt("secret", salt, buf.data(), buflen);
+      int room = buflen < 0 ? 0 : buflen;
+      if (buflen > len) {
+        ASSERT_EQ(r, buf.data()) << buflen;
+        EXPECT_EQ(std::string(buf.data()), full);
+        room = len + 1;
+      } else {
+        ASSERT_EQ(r, nullptr) << buflen;
+        EXPECT_EQ(std::string(buf.data(), room), full.substr(0, room)) << buflen;
+      }
+      for (size_t i = room; i < buf.size(); ++i) ASSERT_EQ(buf[i], '#') << buflen << " at " << i;
+    }
+  }
+}
+
+TEST(Sha256Crypt, B64StopsAtBufferEnd) {
+  char out[8] = "#######";
+  char *cp = out;
+  int left = 2;
+  b64_from_24bit(0xff, 0x00, 0x3f, 4, &left, &cp);
+  EXPECT_EQ(left, 0);
+  EXPECT_EQ(cp, out + 2);
+  EXPECT_EQ(std::string(out), "z.#####");  // 0x3f, then bits 6..11 = 0
+}
+
+TEST(Sha256Crypt, SaltAndRoundsParsing) {
+  const struct {
+    const char *setting;
+    const char *salt;
+    size_t rounds;
+    bool custom;
+  } kCases[] = {
+      {"$5$rounds=10$x", "x", 1000, true},
+      {"rounds=4294967295$x", "x", 999999999, true},
+      {"rounds=99999999999999999999999999$x", "x", 999999999, true},
+      {"rounds=999999999$x", "x", 999999999, true},
+      {"rounds=1000$", "", 1000, true},
+      {"rounds=$abc", "rounds=", 5000, false},       // no digits: salt text
+      {"rounds=+5$abc", "rounds=+5", 5000, false},   // no sign
+      {"rounds= 5$abc", "rounds= 5", 5000, false},   // no blanks
+      {"rounds=5000x$abc", "rounds=5000x", 5000, false},
+      {"rounds=5000", "rounds=5000", 5000, false},   // no '$' after the number
+      {"rounds=12345678901234567890", "rounds=123456789", 5000, false},
+      {"$5$abcdefghijklmnopqrstu", "abcdefghijklmnop", 5000, false},
+      {"$5$", "", 5000, false},
+      {"$5$rounds=2000$rounds=3000$x", "rounds=3000", 2000, true},
+      {"$6$salt", "", 5000, false},  // another scheme's prefix is salt up to '$'
+  };
+  for (const auto &c : kCases) {
+    auto s = ParseCryptSalt(c.setting);
+    EXPECT_EQ(s.salt, c.salt) << c.setting;
+    EXPECT_EQ(s.rounds, c.rounds) << c.setting;
+    EXPECT_EQ(s.customRounds, c.custom) << c.setting;
+  }
+  // The custom rounds are printed even when clamped.
+  EXPECT_EQ(Crypt("k", "rounds=10$ab").rfind("$5$rounds=1000$ab$", 0), 0u);
+  EXPECT_EQ(Crypt("k", "rounds=$ab").rfind("$5$rounds=$", 0), 0u);
+}
+
+TEST(Sha256Crypt, LongKeysAreRefused) {
+  tvxtest::LogCapture log;
+  std::string key256(256, 'k');
+  EXPECT_EQ(Crypt(key256, "$5$s"), tvxtest::SystemCrypt(key256, "$5$s"));
+  char buf[128] = "stale";
+  EXPECT_EQ(SHA256_crypt(std::string(257, 'k').c_str(), "$5$s", buf, sizeof buf), nullptr);
+  EXPECT_EQ(buf[0], '\0');
+  EXPECT_EQ(log.All(), "SHA256_crypt: keys longer than 256 bytes are refused (this one has 257)\n");
+  EXPECT_EQ(SHA256_crypt(nullptr, "$5$s", buf, sizeof buf), nullptr);
+  EXPECT_EQ(SHA256_crypt("k", nullptr, buf, sizeof buf), nullptr);
+}
+
+TEST(Sha256Crypt, AnswerFilePasswordForm) {
+  EXPECT_EQ(AutoInstallCryptLinuxPassword(nullptr), nullptr);
+  const std::string typed = "$(touch x) `id` \"q\" \xe7\x8e\x8b";
+  std::string first, second;
+  // Both calls must fall in one second to draw one salt.
+  for (int tries = 0; tries < 5; ++tries) {
+    time_t t0 = time(nullptr);
+    first = AutoInstallCryptLinuxPassword(typed.c_str());
+    second = AutoInstallCryptLinuxPassword(typed.c_str());
+    if (time(nullptr) == t0) break;
+  }
+  EXPECT_EQ(first, second);
+  ASSERT_EQ(first.size(), 63u) << first;
+  EXPECT_EQ(first.substr(0, 3), "$5$");
+  EXPECT_EQ(first[19], '$');
+  for (char c : first.substr(3, 16)) EXPECT_NE(std::strchr("./0123456789ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz", c), nullptr);
+  EXPECT_EQ(tvxtest::SystemCrypt(typed, first), first);
+  EXPECT_EQ(AutoInstallCryptLinuxPassword(std::string(257, 'p').c_str()), nullptr);
+}
+
+}  // namespace

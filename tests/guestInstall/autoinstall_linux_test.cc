@@ -1,0 +1,530 @@
+// Linux answer files read back by the parsers of their languages (sh,
+// debconf, xmllint/libxml2, perl), their passwords checked with the
+// system's crypt(3), hostile typed texts run through the shell and Perl to
+// prove them inert, the kickstart and AutoYaST choices per version class,
+// and what a failing call leaves behind.
+#include <gtest/gtest.h>
+#include <spawn.h>
+#include <sys/stat.h>
+#include <sys/wait.h>
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <filesystem>
+#include <fstream>
+#include <sstream>
+#include <string>
+#include <vector>
+
+#include "lib/guestInstall/autoinstall_linux_internal.h"
+#include "support/log_capture.h"
+#include "support/system_crypt.h"
+#include "support/unattend_xml.h"
+#include "tvx_autoinstall_linux.h"
+
+extern char **environ;
+
+namespace {
+
+namespace fs = std::filesystem;
+using tvx::autoinstall::linuxAnswerFileTable;
+
+constexpr char kFn[] = "AutoInstall_PrepareAnswerFileEx_Linux: ";
+const std::string kHostileName = "Jo \"JJ\" O'Neil & Co <x> Zo\xc3\xab \xe7\x8e\x8b";
+const std::string kHostilePassword = "$(touch x)`touch x`\"'\\@{[`touch x`]}%s";
+const std::string kRootPassword = "r00t ${HOME} @ARGV \\\" ]]> \xc3\xa9";
+
+struct Ran {
+  int status = -1;
+  std::string out;
+};
+
+// RunIn starts argv (no shell) in `cwd` and collects its standard output.
+Ran RunIn(const std::vector<std::string> &argv, const std::string &cwd) {
+  Ran r;
+  int fds[2];
+  if (pipe(fds) != 0) return r;
+  posix_spawn_file_actions_t fa;
+  posix_spawn_file_actions_init(&fa);
+  posix_spawn_file_actions_adddup2(&fa, fds[1], 1);
+  posix_spawn_file_actions_addclose(&fa, fds[0]);
+  posix_spawn_file_actions_addopen(&fa, 2, "/dev/null", O_WRONLY, 0);
+  posix_spawn_file_actions_addchdir_np(&fa, cwd.c_str());
+  std::vector<char *> args;
+  for (const auto &a : argv) args.push_back(const_cast<char *>(a.c_str()));
+  args.push_back(nullptr);
+  pid_t pid = -1;
+  int rc = posix_spawnp(&pid, args[0], &fa, nullptr, args.data(), environ);
+  posix_spawn_file_actions_destroy(&fa);
+  close(fds[1]);
+  char buf[4096];
+  for (ssize_t n; (n = read(fds[0], buf, sizeof buf)) > 0;) r.out.append(buf, n);
+  close(fds[0]);
+  int st = 0;
+  if (rc == 0 && waitpid(pid, &st, 0) == pid && WIFEXITED(st)) r.status = WEXITSTATUS(st);
+  return r;
+}
+
+std::string Read(const std::string &path) {
+  std::ifstream in(path, std::ios::binary);
+  std::stringstream ss;
+  ss << in.rdbuf();
+  return ss.str();
+}
+
+std::vector<std::string> Lines(const std::string &text) {
+  std::vector<std::string> out;
+  std::stringstream ss(text);
+  for (std::string l; std::getline(ss, l);) out.push_back(l);
+  return out;
+}
+
+bool HasLine(const std::string &text, const std::string &line) {
+  for (const auto &l : Lines(text)) {
+    if (l == line) return true;
+  }
+  return false;
+}
+
+// Value of the first line that begins with `prefix` (the rest of the line).
+std::string After(const std::string &text, const std::string &prefix) {
+  for (const auto &l : Lines(text)) {
+    if (l.rfind(prefix, 0) == 0) return l.substr(prefix.size());
+  }
+  return "<missing " + prefix + ">";
+}
+
+// ShellAccepts: `sh -n` on a script written into `dir`.
+bool ShellAccepts(const std::string &dir, const std::string &script) {
+  std::ofstream(dir + "/script.sh") << script;
+  return RunIn({"sh", "-n", "script.sh"}, dir).status == 0;
+}
+
+// Preseed values continued over lines, joined as the installer joins them.
+std::vector<std::string> PreseedScripts(const std::string &text) {
+  std::vector<std::string> out;
+  std::string cur;
+  bool in = false;
+  for (const auto &l : Lines(text)) {
+    if (!in && (l.find("success_command") != std::string::npos ||
+                l.find("late_command") != std::string::npos)) {
+      in = true;
+      continue;
+    }
+    if (!in) continue;
+    bool more = !l.empty() && l.back() == '\\';
+    cur += more ? l.substr(0, l.size() - 1) : l;
+    if (!more) {
+      out.push_back(cur);
+      cur.clear();
+      in = false;
+    }
+  }
+  return out;
+}
+
+struct Prepared {
+  bool ok = false;
+  std::string path, text;
+};
+
+class LinuxAnswers : public ::testing::Test {
+ protected:
+  Prepared Prepare(const char *guestOS, uint32_t version, const std::string &fullName = "Jo Doe",
+                   const char *key = nullptr, Bool powerOff = FALSE, Bool nvme = FALSE,
+                   const char *user = "jo", const std::string &password = "pw",
+                   const std::string &rootPassword = "rootpw") {
+    Prepared p;
+    std::string out = dir_.Path() + "/out";
+    p.ok = AutoInstall_PrepareAnswerFileEx_Linux(guestOS, version, out.c_str(), user,
+                                                 fullName.c_str(), password.c_str(),
+                                                 rootPassword.c_str(), key, powerOff, 0, nvme);
+    p.path = tvx::autoinstall::LinuxAnswerFilePath(KindOf(guestOS), out.c_str());
+    p.text = Read(p.path);
+    return p;
+  }
+  static AutoInstallLinuxKind KindOf(const std::string &g) {
+    if (g.rfind("ubuntu", 0) == 0) return AUTOINSTALL_LINUX_UBUNTU;
+    if (g.rfind("sles10", 0) == 0) return AUTOINSTALL_LINUX_SLES10;
+    if (g.rfind("sles", 0) == 0 || g.rfind("opensuse", 0) == 0) return AUTOINSTALL_LINUX_SUSE;
+    if (g.rfind("mandriva", 0) == 0) return AUTOINSTALL_LINUX_MANDRIVA;
+    return AUTOINSTALL_LINUX_REDHAT;
+  }
+  tvxtest::TempDir dir_;
+};
+
+// Every kind with hostile texts: the real parser accepts the file, the
+// passwords verify, and the typed texts come back as typed when the guest's
+// own interpreter reads them, without running anything.
+TEST_F(LinuxAnswers, HostileTextsStayIntactAndInert) {
+  const std::string names[] = {kHostileName, "$(touch x) `touch x` @{[`touch x`]} ${HOME}",
+                               "a ]]> b \\ c % d %s", "  spaced  "};
+  for (const std::string &name : names) {
+    SCOPED_TRACE(name);
+    // Red Hat: %post passes sh -n; the chfn line, run by sh, gives the name.
+    Prepared ks = Prepare("rhel7-64", GUESS_VERSION_RHEL_WORKSTATION, name, nullptr, FALSE,
+                          FALSE, "jo", kHostilePassword, kRootPassword);
+    ASSERT_TRUE(ks.ok);
+    std::string post = ks.text.substr(ks.text.find("%post\n") + 6);
+    post = post.substr(0, post.rfind("%end"));
+    EXPECT_TRUE(ShellAccepts(dir_.Path(), post));
+    std::string chfn = After(ks.text, "/usr/bin/chfn ");
+    Ran r = RunIn({"sh", "-c", "chfn() { printf '%s' \"$2\"; }; chfn " + chfn}, dir_.Path());
+    EXPECT_EQ(r.out, name);
+    EXPECT_EQ(tvxtest::SystemCrypt(kRootPassword, After(ks.text, "rootpw --iscrypted ")),
+              After(ks.text, "rootpw --iscrypted "));
+    std::string usermod = After(ks.text, "/usr/sbin/usermod -p '");
+    usermod = usermod.substr(0, usermod.find('\''));
+    EXPECT_EQ(tvxtest::SystemCrypt(kHostilePassword, usermod), usermod);
+
+    // Ubuntu: debconf reads the file; the name is the value as typed.
+    Prepared ps = Prepare("ubuntu-64", GUESS_VERSION_UBUNTU_1504_TO_2004, name, nullptr, FALSE,
+                          FALSE, "jo", kHostilePassword, kRootPassword);
+    ASSERT_TRUE(ps.ok);
+    EXPECT_EQ(RunIn({"debconf-set-selections", "-c", ps.path}, dir_.Path()).status, 0);
+    EXPECT_EQ(After(ps.text, "ubiquity   passwd/user-fullname string   "), name);
+    std::string crypted = After(ps.text, "ubiquity   passwd/user-password-crypted password ");
+    EXPECT_EQ(tvxtest::SystemCrypt(kHostilePassword, crypted), crypted);
+    for (const auto &script : PreseedScripts(ps.text)) EXPECT_TRUE(ShellAccepts(dir_.Path(), script));
+
+    // SUSE: well-formed XML whose forename is the name.
+    Prepared ay = Prepare("sles11-64", GUESS_VERSION_UNKNOWN, name, nullptr, FALSE, FALSE, "jo",
+                          kHostilePassword, kRootPassword);
+    ASSERT_TRUE(ay.ok);
+    EXPECT_TRUE(tvxtest::XmllintAccepts(ay.path));
+    tvxtest::UnattendXml xml(ay.path);
+    EXPECT_EQ(xml.Text("//*[local-name()='forename']"), name);
+    auto pw = xml.Texts("//*[local-name()='user_password']");
+    ASSERT_EQ(pw.size(), 2u);
+    EXPECT_EQ(tvxtest::SystemCrypt(kRootPassword, pw[0]), pw[0]);
+    EXPECT_EQ(tvxtest::SystemCrypt(kHostilePassword, pw[1]), pw[1]);
+    for (const auto &s : xml.Texts("//*[local-name()='source']")) {
+      EXPECT_TRUE(ShellAccepts(dir_.Path(), s));
+    }
+
+    // Mandriva: perl compiles the file and reads back the clear texts.
+    Prepared mi = Prepare("mandriva-64", GUESS_VERSION_MANDRIVA_2008_1_OR_HIGHER, name, nullptr,
+                          FALSE, FALSE, "jo", kHostilePassword, kRootPassword);
+    ASSERT_TRUE(mi.ok);
+    EXPECT_EQ(RunIn({"perl", "-c", mi.path}, dir_.Path()).status, 0);
+    Ran perl = RunIn({"perl", "-e",
+                    "our $o; do $ARGV[0] or die; print join(\"\\0\", $o->{users}[0]{realname}, "
+                    "$o->{users}[0]{password}, $o->{superuser}{password}, $o->{security_user})",
+                    mi.path},
+                   dir_.Path());
+    EXPECT_EQ(perl.out, name + '\0' + kHostilePassword + '\0' + kRootPassword + '\0' + "jo");
+    EXPECT_FALSE(fs::exists(dir_.Path() + "/x")) << "a typed text ran as code";
+  }
+}
+
+// One row per distribution and version class of the Red Hat family.
+TEST_F(LinuxAnswers, KickstartChoices) {
+  const struct {
+    const char *guestOS;
+    GuessVersion version;
+    const char *key;
+    int tmpl;            // 1, 2, 3
+    bool old;            // langsupport, mouse, --resolvedeps, empty zerombr switch
+    bool modern;         // %end active, zerombr and xconfig commented
+    bool biosboot;
+    bool python;
+    const char *keyLine;
+    const char *firstPackage, *lastPackage;
+    const char *argument;
+  } kRows[] = {
+      {"asianux3", GUESS_VERSION_UNKNOWN, nullptr, 1, false, false, false, true, "#key --skip",
+       "@ base-x", "@ kde-desktop", "ks=cdrom:/ks.cfg"},
+      {"asianux4-64", GUESS_VERSION_UNKNOWN, nullptr, 1, false, true, false, true, "#key --skip",
+       "@ Chinese-support", "@ x11", "ks=cdrom:/ks.cfg"},
+      {"rhel6-64", GUESS_VERSION_RHEL_SERVER, "abc-123", 1, false, true, false, true,
+       "#key abc-123", "@ Desktop", "kernel-devel", "ks=cdrom:/ks.cfg"},
+      {"centos6-64", GUESS_VERSION_CENTOS_6, nullptr, 1, false, true, false, true, "#key --skip",
+       "@ Desktop", "kernel-devel", "ks=cdrom:/ks.cfg"},
+      {"rhel7-64", GUESS_VERSION_RHEL_SERVER, nullptr, 3, false, true, false, true,
+       "#key --skip", "gcc", "@guest-desktop-agents", "ks=cdrom:/ks.cfg"},
+      {"rhel7-64", GUESS_VERSION_RHEL_WORKSTATION, nullptr, 3, false, true, false, true,
+       "#key --skip", "gcc", "@x11", "ks=cdrom:/ks.cfg"},
+      {"centos7-64", GUESS_VERSION_CENTOS_7, nullptr, 3, false, true, false, true, "#key --skip",
+       "gcc", "@x11", "ks=cdrom:/ks.cfg"},
+      {"rhel8-64", GUESS_VERSION_RHEL_WORKSTATION, nullptr, 3, false, true, false, false,
+       "#key --skip", "gcc", "xorg-x11-drv-tarvex", "ks=cdrom:/ks.cfg"},
+      {"centos8-64", GUESS_VERSION_CENTOS_8, nullptr, 3, false, true, false, false,
+       "#key --skip", "gcc", "xorg-x11-drv-tarvex", "ks=cdrom:/ks.cfg"},
+      {"rhel5", GUESS_VERSION_RHEL_CLIENT, "0123-abcd", 1, false, false, false, true,
+       "key 0123-abcd", "@ X Window System", "@ Development Tools", "ks=cdrom:/ks.cfg"},
+      {"rhel5-64", GUESS_VERSION_RHEL_CLIENT, "", 1, false, false, false, true, "key --skip",
+       "@ X Window System", "@ Development Tools", "ks=cdrom:/ks.cfg"},
+      {"rhel4", GUESS_VERSION_RHEL_SERVER, nullptr, 1, true, false, false, true, "#key --skip",
+       "@ X Window System", "@ Development Tools", "ks=cdrom:/ks.cfg"},
+      {"centos5", GUESS_VERSION_CENTOS_5, nullptr, 1, false, false, false, true, "key --skip",
+       "@ X Window System", "@ Development Tools", "ks=cdrom:/ks.cfg"},
+      {"fedora", GUESS_VERSION_FEDORA_8, nullptr, 1, false, false, false, true, "#key --skip",
+       "@ X Window System", "@ Development Tools", "ks=cdrom:/ks.cfg"},
+      {"fedora", GUESS_VERSION_FEDORA_9_TO_12, nullptr, 1, false, false, false, true,
+       "#key --skip", "@ X Window System", "@ Fonts", "ks=cdrom:/ks.cfg"},
+      {"fedora-64", GUESS_VERSION_FEDORA_14_TO_16, nullptr, 1, false, true, true, true,
+       "#key --skip", "@ X Window System", "@ Fonts", "ks=cdrom:/ks.cfg"},
+      {"fedora-64", GUESS_VERSION_FEDORA_17, nullptr, 1, false, true, true, true, "#key --skip",
+       "@ X Window System", "@ Fonts", "ks=cdrom:/dev/cdrom:/ks.cfg"},
+      {"fedora", GUESS_VERSION_FEDORA_18, nullptr, 1, false, true, true, true, "#key --skip",
+       "@base-x", "kernel-PAE-devel", "ks=cdrom:/dev/cdrom:/ks.cfg"},
+      {"fedora-64", GUESS_VERSION_FEDORA_18, nullptr, 1, false, true, true, true, "#key --skip",
+       "@base-x", "@standard", "ks=cdrom:/dev/cdrom:/ks.cfg"},
+      {"fedora-64", GUESS_VERSION_FEDORA_19_TO_20, nullptr, 2, false, true, true, true,
+       "#key --skip", "@base-x", "@standard", "ks=cdrom:/dev/cdrom:/ks.cfg"},
+      {"fedora-64", GUESS_VERSION_FEDORA_21, nullptr, 2, false, true, true, true, "#key --skip",
+       "@c-development", "@standard", "ks=cdrom:/ks.cfg"},
+      {"fedora-64", GUESS_VERSION_FEDORA_22_TO_28, nullptr, 2, false, true, true, true,
+       "#key --skip", "@container-management", "@standard", "ks=cdrom:/ks.cfg"},
+      {"fedora-64", GUESS_VERSION_FEDORA_29_OR_HIGHER, nullptr, 2, false, true, true, false,
+       "#key --skip", "@container-management", "@standard", "ks=cdrom:/ks.cfg"},
+  };
+  for (const auto &row : kRows) {
+    SCOPED_TRACE(std::string(row.guestOS) + " version " + std::to_string(row.version));
+    linuxAnswerFileTable[AUTOINSTALL_LINUX_REDHAT].bootArguments = "stale";
+    Prepared p = Prepare(row.guestOS, row.version, "Jo Doe", row.key, TRUE);
+    ASSERT_TRUE(p.ok);
+    const std::string &t = p.text;
+    bool isTmpl1 = t.find("s/ rhgb//") != std::string::npos;
+    bool isTmpl2 = HasLine(t, "#/usr/bin/chfn -f \"Jo Doe\" jo");
+    bool isTmpl3 = t.find("S99rclocal") != std::string::npos;
+    EXPECT_EQ(isTmpl1 + isTmpl2 + isTmpl3, 1);
+    EXPECT_EQ(row.tmpl == 1 ? isTmpl1 : row.tmpl == 2 ? isTmpl2 : isTmpl3, true);
+    const char *o = row.old ? "" : "#";
+    EXPECT_TRUE(HasLine(t, std::string(o) + "langsupport --default en_US"));
+    EXPECT_TRUE(HasLine(t, std::string(o) + "mouse generic3ps/2"));
+    EXPECT_TRUE(HasLine(t, row.old ? "%packages --resolvedeps" : "%packages"));
+    EXPECT_TRUE(HasLine(t, row.modern ? "zerombr #yes" : "zerombr yes"));
+    EXPECT_TRUE(HasLine(t, row.modern ? "xconfig --startxonboot #--resolution=800x600"
+                                      : "xconfig --startxonboot --resolution=800x600"));
+    EXPECT_TRUE(HasLine(t, std::string(row.biosboot ? "" : "#") +
+                               "part biosboot --fstype=biosboot --size=1"));
+    EXPECT_TRUE(HasLine(t, row.python ? "python" : "#python"));
+    EXPECT_TRUE(HasLine(t, row.keyLine));
+    EXPECT_TRUE(HasLine(t, "poweroff"));
+    // The package list runs from the line after "python" to the first blank
+    // line or %end.
+    auto lines = Lines(t);
+    size_t i = 0;
+    while (i < lines.size() && lines[i] != "python" && lines[i] != "#python") ++i;
+    ASSERT_LT(i + 1, lines.size());
+    EXPECT_EQ(lines[i + 1], row.firstPackage);
+    size_t j = i + 1;
+    while (j + 1 < lines.size() && !lines[j + 1].empty() && lines[j + 1].find("%end") == std::string::npos) ++j;
+    EXPECT_EQ(lines[j], row.lastPackage);
+    // Both %end lines share one switch.
+    size_t ends = 0, active = 0;
+    for (const auto &l : lines) {
+      ends += l == "%end" || l == "#%end";
+      active += l == "%end";
+    }
+    EXPECT_EQ(ends, 2u);
+    EXPECT_EQ(active, row.modern ? 2u : 0u);
+    EXPECT_STREQ(linuxAnswerFileTable[AUTOINSTALL_LINUX_REDHAT].bootArguments, row.argument);
+  }
+}
+
+// One row per rule of the SUSE choice.
+TEST_F(LinuxAnswers, AutoYastChoices) {
+  const struct {
+    const char *guestOS;
+    GuessVersion version;
+    bool templateA;
+    const char *firstPattern, *lastPattern;
+    bool kernelDevel;
+    const char *displayManager;
+    const char *device;  // tools CD in template A
+  } kRows[] = {
+      {"sles12-64", GUESS_VERSION_SLED_ALL, false, "32bit", "Basis-Devel", false, "gdm", ""},
+      {"sles11-64", GUESS_VERSION_SLED_ALL, true, "default", "Basis-Devel", false, "gdm", "sr0"},
+      {"opensuse-64", GUESS_VERSION_SLED_ALL, true, "default", "Basis-Devel", false, "kdm", "sr0"},
+      {"sles12-64", GUESS_VERSION_UNKNOWN, false, "32bit", "Basis-Devel", false, "gdm", ""},
+      {"sles11", GUESS_VERSION_UNKNOWN, true, "base", "Basis-Devel", false, "gdm", "sr0"},
+      {"sles10-64", GUESS_VERSION_UNKNOWN, true, "default", "Basis-Devel", false, "gdm", "hda"},
+      {"opensuse-64", GUESS_VERSION_OPENSUSE_13_2_OR_HIGHER, true, "kde", "devel_C_C++", true,
+       "kdm", "sr0"},
+      {"opensuse", GUESS_VERSION_OPENSUSE_12, false, "kde4", "devel_C_C++", true, "kdm", ""},
+      {"opensuse", GUESS_VERSION_UNKNOWN, true, "kde4", "devel_C_C++", true, "kdm", "sr0"},
+  };
+  for (const auto &row : kRows) {
+    SCOPED_TRACE(std::string(row.guestOS) + " version " + std::to_string(row.version));
+    Prepared p = Prepare(row.guestOS, row.version, "Jo Doe", nullptr, TRUE);
+    ASSERT_TRUE(p.ok);
+    ASSERT_TRUE(tvxtest::XmllintAccepts(p.path));
+    tvxtest::UnattendXml xml(p.path);
+    auto patterns = xml.Texts("//*[local-name()='pattern']");
+    ASSERT_FALSE(patterns.empty());
+    EXPECT_EQ(patterns.front(), row.firstPattern);
+    EXPECT_EQ(patterns.back(), row.lastPattern);
+    EXPECT_EQ(xml.Count("//*[local-name()='package']"), row.kernelDevel ? 1u : 0u);
+    EXPECT_EQ(xml.Text("//*[local-name()='display_manager']"), row.displayManager);
+    EXPECT_EQ(xml.Text("//*[local-name()='sysconfig_value']"), row.displayManager);
+    EXPECT_EQ(xml.Text("//*[local-name()='final_halt']"), "true");
+    EXPECT_EQ(xml.Count("//*[local-name()='chroot-scripts']"), row.templateA ? 1u : 0u);
+    if (row.templateA) {
+      EXPECT_NE(p.text.find(std::string("mount -t iso9660 /dev/") + row.device + " "),
+                std::string::npos);
+    }
+  }
+}
+
+TEST_F(LinuxAnswers, PreseedVariants) {
+  const struct {
+    GuessVersion version;
+    Bool nvme, powerOff;
+    bool network;
+  } kRows[] = {
+      {GUESS_VERSION_UBUNTU_710_OR_HIGHER, FALSE, FALSE, false},
+      {GUESS_VERSION_UBUNTU_SERVER_810_OR_HIGHER, TRUE, TRUE, false},
+      {GUESS_VERSION_UBUNTU_1404, FALSE, TRUE, true},
+      {GUESS_VERSION_UBUNTU_2010_OR_HIGHER, TRUE, FALSE, true},
+      {GUESS_VERSION_UBUNTU_SERVER_1504_OR_HIGHER, FALSE, FALSE, true},
+  };
+  for (const auto &row : kRows) {
+    SCOPED_TRACE(row.version);
+    Prepared p = Prepare("ubuntu-64", row.version, "Jo Doe", nullptr, row.powerOff, row.nvme);
+    ASSERT_TRUE(p.ok);
+    EXPECT_EQ(p.path, dir_.Path() + "/out/custom/preseed.cfg");
+    EXPECT_TRUE(HasLine(p.text, std::string("ubiquity   partman-auto/disk string   ") +
+                                    (row.nvme ? "/dev/nvme0n1" : "/dev/sda")));
+    EXPECT_TRUE(HasLine(p.text, std::string("ubiquity   ubiquity/") +
+                                    (row.powerOff ? "poweroff" : "reboot") + " boolean true"));
+    std::string flag = row.network ? "if [ true = true ]" : "if [ false = true ]";
+    auto scripts = PreseedScripts(p.text);
+    ASSERT_EQ(scripts.size(), 2u);
+    EXPECT_EQ(scripts[0], scripts[1]);
+    EXPECT_NE(scripts[0].find(flag), std::string::npos);
+    EXPECT_EQ(scripts[0].find("archive.ubuntu.com") != std::string::npos, row.network);
+    EXPECT_EQ(scripts[0].find("run_upgrader.sh' >>") != std::string::npos, !row.network);
+  }
+}
+
+// Refused and failing calls, with what each leaves behind.
+TEST_F(LinuxAnswers, FailuresLeaveNothingBehind) {
+  const std::string out = dir_.Path() + "/out/deeper";
+  const std::string longPassword(300, 'p');
+  struct Case {
+    const char *what;
+    const char *guestOS, *user, *fullName, *password, *root, *key;
+    const char *log;
+  } kCases[] = {
+      {"unknown guest", "windows9-64", "jo", "Jo", "p", "r", nullptr, ""},
+      {"null guest", nullptr, "jo", "Jo", "p", "r", nullptr, ""},
+      {"null user", "rhel7-64", nullptr, "Jo", "p", "r", nullptr, ""},
+      {"null full name", "rhel7-64", "jo", nullptr, "p", "r", nullptr, ""},
+      {"null password", "sles11-64", "jo", "Jo", nullptr, "r", nullptr, ""},
+      {"null root password for Ubuntu", "ubuntu-64", "jo", "Jo", "p", nullptr, nullptr, ""},
+      {"user with a capital", "rhel7-64", "Jo", "Jo", "p", "r", nullptr,
+       "the user name is refused: only a-z, 0-9 and '-' are allowed\n"},
+      {"user with shell code", "rhel7-64", "jo;reboot", "Jo", "p", "r", nullptr,
+       "the user name is refused: only a-z, 0-9 and '-' are allowed\n"},
+      {"Ubuntu user with a digit first", "ubuntu-64", "9lives", "Jo", "p", "r", nullptr,
+       "the user name is refused: only a-z, 0-9 and '-' are allowed, and it must begin with a "
+       "letter\n"},
+      {"line break in the full name", "ubuntu-64", "jo", "Jo\nd-i preseed/late_command string reboot",
+       "p", "r", nullptr, "the full name is refused: it holds a control character\n"},
+      {"full name ending in a backslash", "ubuntu-64", "jo", "Jo \\", "p", "r", nullptr,
+       "the full name is refused: it ends in a backslash\n"},
+      {"Latin-1 full name", "sles11-64", "jo", "Zo\xeb", "p", "r", nullptr,
+       "the full name is refused: it is not valid UTF-8 text\n"},
+      {"overlong UTF-8", "sles11-64", "jo", "\xc0\xaf", "p", "r", nullptr,
+       "the full name is refused: it is not valid UTF-8 text\n"},
+      {"surrogate in UTF-8", "sles11-64", "jo", "\xed\xa0\x80", "p", "r", nullptr,
+       "the full name is refused: it is not valid UTF-8 text\n"},
+      {"C1 control", "sles11-64", "jo", "a\xc2\x85" "b", "p", "r", nullptr,
+       "the full name is refused: it holds a control character\n"},
+      {"U+FFFE", "sles11-64", "jo", "\xef\xbf\xbe", "p", "r", nullptr,
+       "the full name is refused: it is not valid UTF-8 text\n"},
+      {"cut UTF-8", "sles11-64", "jo", "Zo\xc3", "p", "r", nullptr,
+       "the full name is refused: it is not valid UTF-8 text\n"},
+      {"key with a line break", "rhel5", "jo", "Jo", "p", "r", "x\n%post\nreboot",
+       "the installation key is refused: only letters, digits and '-' are allowed\n"},
+      {"password too long for the crypt", "rhel7-64", "jo", "Jo", longPassword.c_str(), "r",
+       nullptr, "SHA256_crypt: keys longer than 256 bytes are refused (this one has 300)\n"},
+  };
+  for (const auto &c : kCases) {
+    SCOPED_TRACE(c.what);
+    tvxtest::LogCapture log;
+    EXPECT_FALSE(AutoInstall_PrepareAnswerFileEx_Linux(c.guestOS, 0, out.c_str(), c.user,
+                                                       c.fullName, c.password, c.root, c.key,
+                                                       FALSE, 0, FALSE));
+    EXPECT_FALSE(fs::exists(dir_.Path() + "/out"));
+    if (c.log[0] != '\0') {
+      ASSERT_FALSE(log.Lines().empty());
+      const std::string want = c.log[0] == 'S' ? c.log : kFn + std::string(c.log);
+      EXPECT_EQ(log.Lines().front(), want);
+    } else {
+      EXPECT_EQ(log.All(), "");
+    }
+  }
+
+  // The answer file's name is taken by a directory: the directories made
+  // for it go again; a directory that was there stays.
+  fs::create_directories(dir_.Path() + "/pre/made/ks.cfg");
+  tvxtest::LogCapture log;
+  EXPECT_FALSE(AutoInstall_PrepareAnswerFileEx_Linux(
+      "rhel7-64", 0, (dir_.Path() + "/pre/made").c_str(), "jo", "Jo", "p", "r", nullptr, FALSE, 0,
+      FALSE));
+  EXPECT_TRUE(fs::is_directory(dir_.Path() + "/pre/made/ks.cfg"));
+  // Ubuntu's "custom" directory cannot be made: nothing new appears.
+  fs::create_directories(dir_.Path() + "/ub");
+  std::ofstream(dir_.Path() + "/ub/custom") << "x";
+  EXPECT_FALSE(AutoInstall_PrepareAnswerFileEx_Linux("ubuntu-64", GUESS_VERSION_UBUNTU_1404,
+                                                     (dir_.Path() + "/ub").c_str(), "jo", "Jo",
+                                                     "p", "r", nullptr, FALSE, 0, FALSE));
+  EXPECT_EQ(Read(dir_.Path() + "/ub/custom"), "x");
+  EXPECT_EQ(std::distance(fs::directory_iterator(dir_.Path() + "/ub"), fs::directory_iterator()), 1);
+  // Under an output directory that cannot be made, nothing appears.
+  std::ofstream(dir_.Path() + "/plainfile") << "x";
+  EXPECT_FALSE(AutoInstall_PrepareAnswerFileEx_Linux(
+      "sles11-64", 0, (dir_.Path() + "/plainfile/sub").c_str(), "jo", "Jo", "p", "r", nullptr,
+      FALSE, 0, FALSE));
+  EXPECT_EQ(Read(dir_.Path() + "/plainfile"), "x");
+}
+
+// A rewrite replaces the whole file, keeps it private and never writes
+// through a link planted at its name.
+TEST_F(LinuxAnswers, RewriteTruncatesAndStaysPrivate) {
+  const std::string outDir = dir_.Path() + "/out";
+  Prepared first = Prepare("mandriva-64", 0, std::string(500, 'n'));
+  ASSERT_TRUE(first.ok);
+  Prepared second = Prepare("mandriva-64", 0, "Jo");
+  ASSERT_TRUE(second.ok);
+  EXPECT_LT(second.text.size(), first.text.size());
+  EXPECT_EQ(second.text.substr(second.text.size() - 3), "};\n");
+  struct stat st {};
+  ASSERT_EQ(stat(second.path.c_str(), &st), 0);
+  EXPECT_EQ(st.st_mode & 07777, 0600u);
+
+  std::string victim = dir_.Path() + "/victim";
+  std::ofstream(victim) << "keep";
+  fs::remove(outDir + "/ks.cfg");
+  fs::create_symlink(victim, outDir + "/ks.cfg");
+  ASSERT_TRUE(Prepare("centos7-64", GUESS_VERSION_CENTOS_7).ok);
+  EXPECT_EQ(Read(victim), "keep");
+  EXPECT_FALSE(fs::is_symlink(outDir + "/ks.cfg"));
+}
+
+TEST(LinuxAnswerFileTable, RowsByKind) {
+  const struct {
+    AutoInstallLinuxKind kind;
+    const char *file;
+    Bool floppy;
+    const char *bootStart;
+  } kRows[] = {
+      {AUTOINSTALL_LINUX_UBUNTU, "preseed.cfg", TRUE, "debian-installer/custom-installation=/custom "},
+      {AUTOINSTALL_LINUX_SUSE, "autoinst.xml", TRUE, "autoyast=floppy:///autoinst.xml install=cd:/?device=sr1 "},
+      {AUTOINSTALL_LINUX_SLES10, "autoinst.xml", TRUE, "autoyast=floppy:///autoinst.xml install=cd:/?device=hdc "},
+      {AUTOINSTALL_LINUX_MANDRIVA, "auto_i~1.cfg", TRUE, "auto_install=floppy"},
+  };
+  EXPECT_EQ(linuxAnswerFileTable[AUTOINSTALL_LINUX_NONE].answerFileName, nullptr);
+  EXPECT_STREQ(linuxAnswerFileTable[AUTOINSTALL_LINUX_REDHAT].answerFileName, "ks.cfg");
+  EXPECT_FALSE(linuxAnswerFileTable[AUTOINSTALL_LINUX_REDHAT].needsFloppy);
+  for (const auto &r : kRows) {
+    EXPECT_STREQ(linuxAnswerFileTable[r.kind].answerFileName, r.file);
+    EXPECT_EQ(linuxAnswerFileTable[r.kind].needsFloppy, r.floppy);
+    EXPECT_EQ(std::string(linuxAnswerFileTable[r.kind].bootArguments).rfind(r.bootStart, 0), 0u);
+  }
+}
+
+}  // namespace

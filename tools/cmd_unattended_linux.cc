@@ -1,0 +1,300 @@
+// tvxguest unattended linux: recognise a Linux install image and write its
+// answer file. The file is made in a staging directory beside --out and
+// moved into place only when the whole call succeeded, so a failing call
+// leaves neither a file nor a directory behind.
+#if __has_include("command_group.h") && __has_include("unattended_common.h")
+#include <stdlib.h>
+#include <unistd.h>
+
+#include <cstdio>
+#include <cstring>
+#include <filesystem>
+#include <fstream>
+#include <string>
+#include <system_error>
+#include <vector>
+
+#include "command.h"
+#include "command_group.h"
+#include "json.h"
+#include "tvx_autoinstall.h"
+#include "tvx_autoinstall_linux.h"
+#include "tvx_guess.h"
+#include "tvx_log.h"
+#include "unattended_common.h"
+#include "unattended_linux_media.h"
+
+namespace tvxcli {
+namespace {
+
+namespace fs = std::filesystem;
+
+constexpr char kName[] = "unattended linux";
+
+void PrintHelp() {
+  std::printf(
+      "Usage: tvxguest unattended linux [OPTIONS] --out DIR IMAGE\n\n"
+      "Recognise the Linux install image IMAGE and write its answer file into DIR\n"
+      "(created when missing): ks.cfg (Red Hat family), custom/preseed.cfg (Ubuntu),\n"
+      "autoinst.xml (SUSE) or auto_i~1.cfg (Mandriva). Passwords are written in their\n"
+      "SHA-256 crypt form (Mandriva's installer takes them only in clear). The file is\n"
+      "readable by its owner only; on failure nothing is left in DIR.\n\n"
+      "Options:\n"
+      "  --user NAME              login name of the user account (required)\n"
+      "  --full-name TEXT         the user's full name (required)\n"
+      "  --password TEXT          the user's password\n"
+      "  --password-file FILE     read it from the first line of FILE instead\n"
+      "  --root-password TEXT     root's password (default: the user's password)\n"
+      "  --root-password-file FILE  read it from the first line of FILE instead\n"
+      "  --install-key KEY        installation number for the Red Hat installer\n"
+      "  --power-off              power the guest off after the install (default: reboot)\n"
+      "  --nvme                   the guest's disk is NVMe (Ubuntu)\n"
+      "  --out DIR                output directory (required)\n"
+      "  --media DIR              then make the guest's medium in DIR: autoinst.flp and/or\n"
+      "                           autoinst.iso (the install medium's boot tree)\n"
+      "%s"
+      "  --json                   print one JSON object instead of text\n"
+      "  -h, --help               show this help\n\n"
+      "Exit status: 0 written, 1 not recognised or not written, 2 IMAGE cannot be\n"
+      "opened, 64 usage error.\n",
+      kLinuxMediaHelp);
+}
+
+struct Options {
+  std::string user, fullName, password, rootPassword, key, out, image;
+  bool haveRoot = false, haveKey = false, powerOff = false, nvme = false, json = false;
+  LinuxMediaOptions media;
+};
+
+bool ReadFirstLine(const std::string &path, std::string *out) {
+  std::ifstream in(path);
+  if (!in) return false;
+  std::getline(in, *out);
+  if (!out->empty() && out->back() == '\r') out->pop_back();
+  return true;
+}
+
+// Parse fills `o`; returns -1 to go on, else the exit status.
+int Parse(const std::vector<std::string> &args, Options *o) {
+  struct Valued {
+    const char *flag;
+    std::string *value;
+    bool given = false;
+  };
+  std::string passwordFile, rootFile;
+  Valued valued[] = {
+      {"--user", &o->user},          {"--full-name", &o->fullName},
+      {"--password", &o->password},  {"--password-file", &passwordFile},
+      {"--root-password", &o->rootPassword}, {"--root-password-file", &rootFile},
+      {"--install-key", &o->key},    {"--out", &o->out},
+  };
+  enum { kUser, kFullName, kPassword, kPasswordFile, kRoot, kRootFile, kKey, kOut };
+  const std::pair<const char *, bool *> flags[] = {
+      {"--json", &o->json}, {"--power-off", &o->powerOff}, {"--nvme", &o->nvme}};
+  std::vector<std::string> positional;
+  for (size_t i = 0; i < args.size(); ++i) {
+    const std::string &a = args[i];
+    if (IsHelp(a)) {
+      PrintHelp();
+      return 0;
+    }
+    bool known = false;
+    for (const auto &[flag, value] : flags) {
+      if (a == flag) *value = known = true;
+    }
+    for (Valued &v : valued) {
+      if (known) break;
+      std::string flag = v.flag;
+      if (a == flag) {
+        if (i + 1 >= args.size()) return UsageError(kName, a + " needs a value");
+        *v.value = args[++i];
+      } else if (a.rfind(flag + "=", 0) == 0) {
+        *v.value = a.substr(flag.size() + 1);
+      } else {
+        continue;
+      }
+      v.given = known = true;
+    }
+    if (known) continue;
+    if (int taken = TakeLinuxMediaOption(kName, args, &i, &o->media)) {
+      if (taken != 1) return taken;
+      continue;
+    }
+    if (a.size() > 1 && a[0] == '-') return UsageError(kName, "unknown option '" + a + "'");
+    positional.push_back(a);
+  }
+  if (positional.size() != 1) return UsageError(kName, "expected exactly one IMAGE");
+  o->image = positional[0];
+  for (int required : {kUser, kFullName, kOut}) {
+    if (!valued[required].given) {
+      return UsageError(kName, std::string(valued[required].flag) + " is required");
+    }
+  }
+  // Each password comes from the command line or from a file, not both.
+  const struct {
+    int text, file;
+    std::string *value;
+    const char *file_path;
+  } secrets[] = {{kPassword, kPasswordFile, &o->password, passwordFile.c_str()},
+                 {kRoot, kRootFile, &o->rootPassword, rootFile.c_str()}};
+  for (const auto &s : secrets) {
+    if (valued[s.text].given && valued[s.file].given) {
+      return UsageError(kName, std::string("give ") + valued[s.text].flag + " or " +
+                                   valued[s.file].flag + ", not both");
+    }
+    if (valued[s.file].given && !ReadFirstLine(s.file_path, s.value)) {
+      std::fprintf(stderr, "tvxguest %s: cannot read %s\n", kName, s.file_path);
+      return 1;
+    }
+  }
+  if (!valued[kPassword].given && !valued[kPasswordFile].given) {
+    return UsageError(kName, "--password or --password-file is required");
+  }
+  o->haveRoot = valued[kRoot].given || valued[kRootFile].given;
+  o->haveKey = valued[kKey].given;
+  return -1;
+}
+
+void Capture(TvxLogLevel, const char *text, void *ctx) {
+  std::string line = text;
+  if (!line.empty() && line.back() == '\n') line.pop_back();
+  static_cast<std::vector<std::string> *>(ctx)->push_back(line);
+}
+
+// Staging is a private directory beside the output directory (in its
+// nearest existing ancestor, so renames stay on one file system); it is
+// removed with whatever is left in it.
+class Staging {
+ public:
+  explicit Staging(const fs::path &out) {
+    fs::path base = out;
+    std::error_code ec;
+    while (!base.empty() && !fs::exists(base, ec) && base != base.parent_path()) {
+      base = base.parent_path();
+    }
+    std::string tmpl = (base / ".tvxguest-stage-XXXXXX").string();
+    if (mkdtemp(tmpl.data()) != nullptr) path_ = tmpl;
+  }
+  ~Staging() {
+    std::error_code ec;
+    if (!path_.empty()) fs::remove_all(path_, ec);
+  }
+  Staging(const Staging &) = delete;
+  Staging &operator=(const Staging &) = delete;
+  const std::string &Path() const { return path_; }
+
+  // Commit moves every file made in the staging directory to the same place
+  // below `out`; on failure the directories it made are removed again.
+  bool Commit(const fs::path &out, std::vector<std::string> *out_files, std::string *out_error) {
+    std::error_code ec;
+    fs::path firstMissing;
+    for (fs::path p = out; !p.empty() && !fs::exists(p, ec); p = p.parent_path()) {
+      firstMissing = p;
+      if (p == p.parent_path()) break;
+    }
+    for (auto it = fs::recursive_directory_iterator(path_, ec);
+         !ec && it != fs::recursive_directory_iterator(); it.increment(ec)) {
+      if (!it->is_regular_file(ec)) continue;
+      fs::path target = out / fs::relative(it->path(), path_, ec);
+      fs::create_directories(target.parent_path(), ec);
+      if (!ec) fs::rename(it->path(), target, ec);
+      if (ec) break;
+      out_files->push_back(target.string());
+    }
+    if (!ec) return true;
+    *out_error = ec.message();
+    std::error_code ignored;
+    if (!firstMissing.empty()) fs::remove_all(firstMissing, ignored);
+    out_files->clear();
+    return false;
+  }
+
+ private:
+  std::string path_;
+};
+
+int Run(const std::vector<std::string> &args) {
+  Options o;
+  int rc = Parse(args, &o);
+  if (rc >= 0) return rc;
+
+  GuessResult guess;
+  int guessRc = RecogniseImage(kName, o.image, &guess);
+  if (guessRc != 0 || guess.guestOS == nullptr) {
+    if (o.json) {
+      std::printf("%s\n", JsonObject()
+                              .Bool("result", false)
+                              .Num("guessResult", guessRc)
+                              .StrOrNull("guestOS", nullptr)
+                              .Text()
+                              .c_str());
+    } else if (guessRc != 2) {
+      std::fprintf(stderr, "tvxguest %s: no guest OS recognised on %s\n", kName,
+                   o.image.c_str());
+    }
+    return guessRc == 2 ? 2 : 1;
+  }
+  bool supported = AutoInstall_IsSupportedGuest(&guess);
+  if (!supported && !o.json) {
+    std::fprintf(stderr, "tvxguest %s: note: unattended install is not offered for %s\n", kName,
+                 GuestLabel(guess).c_str());
+  }
+
+  // The library's reasons are collected so that a failure can show them
+  // without -v.
+  std::vector<std::string> log, files;
+  Staging stage(o.out);
+  bool ok = !stage.Path().empty();
+  if (!ok) log.push_back("cannot make a staging directory beside " + o.out + ": " + std::strerror(errno));
+  if (ok) {
+    if (!Verbose()) Tvx_SetLogSink(Capture, &log);
+    ok = AutoInstall_PrepareAnswerFileEx_Linux(
+        guess.guestOS, guess.version, stage.Path().c_str(), o.user.c_str(), o.fullName.c_str(),
+        o.password.c_str(), (o.haveRoot ? o.rootPassword : o.password).c_str(),
+        o.haveKey ? o.key.c_str() : nullptr, o.powerOff, 0, o.nvme);
+    if (!Verbose()) Tvx_SetLogSink(nullptr, nullptr);
+    if (!ok && log.empty()) {
+      log.push_back(std::string("no Linux answer file is made for ") + guess.guestOS);
+    }
+  }
+  std::string error;
+  if (ok && !stage.Commit(o.out, &files, &error)) {
+    ok = false;
+    log.push_back("cannot move the answer file into " + o.out + ": " + error);
+  }
+  ok = ok && ContinueWithMedia(o.image, guess, o.out, o.media, o.json, &files, &log);
+
+  const char *versionName =
+      guess.version < GUESS_VERSION_DUMMY_LAST
+          ? Guess_GetSubString(static_cast<GuessVersion>(guess.version))
+          : "";
+  if (o.json) {
+    std::printf("%s\n", JsonObject()
+                            .Bool("result", ok)
+                            .Str("guestOS", guess.guestOS)
+                            .Num("version", guess.version)
+                            .Str("versionName", versionName != nullptr ? versionName : "")
+                            .Bool("supported", supported)
+                            .StrArray("files", files)
+                            .StrArray("log", log)
+                            .Text()
+                            .c_str());
+    return ok ? 0 : 1;
+  }
+  std::printf("%s: %s\n", o.image.c_str(), GuestLabel(guess).c_str());
+  if (!ok) {
+    std::fprintf(stderr, "tvxguest %s: the answer file was not written\n", kName);
+    for (const std::string &line : log) std::fprintf(stderr, "  %s\n", line.c_str());
+    return 1;
+  }
+  for (const std::string &f : files) std::printf("wrote %s\n", f.c_str());
+  return 0;
+}
+
+const SubcommandRegistration kRegistration(
+    kUnattendedGroup, {"linux", "write the Linux answer file for an install image", Run});
+
+}  // namespace
+}  // namespace tvxcli
+
+#endif
