@@ -18,11 +18,11 @@
 
 #include "lib/guestInstall/autoinstall_linux_internal.h"
 #include "support/log_capture.h"
+#include "support/run_argv.h"
 #include "support/system_crypt.h"
 #include "support/unattend_xml.h"
 #include "tvx_autoinstall_linux.h"
 
-extern char **environ;
 
 namespace {
 
@@ -42,26 +42,7 @@ struct Ran {
 // RunIn starts argv (no shell) in `cwd` and collects its standard output.
 Ran RunIn(const std::vector<std::string> &argv, const std::string &cwd) {
   Ran r;
-  int fds[2];
-  if (pipe(fds) != 0) return r;
-  posix_spawn_file_actions_t fa;
-  posix_spawn_file_actions_init(&fa);
-  posix_spawn_file_actions_adddup2(&fa, fds[1], 1);
-  posix_spawn_file_actions_addclose(&fa, fds[0]);
-  posix_spawn_file_actions_addopen(&fa, 2, "/dev/null", O_WRONLY, 0);
-  posix_spawn_file_actions_addchdir_np(&fa, cwd.c_str());
-  std::vector<char *> args;
-  for (const auto &a : argv) args.push_back(const_cast<char *>(a.c_str()));
-  args.push_back(nullptr);
-  pid_t pid = -1;
-  int rc = posix_spawnp(&pid, args[0], &fa, nullptr, args.data(), environ);
-  posix_spawn_file_actions_destroy(&fa);
-  close(fds[1]);
-  char buf[4096];
-  for (ssize_t n; (n = read(fds[0], buf, sizeof buf)) > 0;) r.out.append(buf, n);
-  close(fds[0]);
-  int st = 0;
-  if (rc == 0 && waitpid(pid, &st, 0) == pid && WIFEXITED(st)) r.status = WEXITSTATUS(st);
+  r.status = tvxtest::RunArgv(argv, &r.out, {.cwd = cwd.c_str()});
   return r;
 }
 

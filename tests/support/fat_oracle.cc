@@ -1,55 +1,24 @@
 #include "support/fat_oracle.h"
 
-#include <spawn.h>
-#include <sys/wait.h>
-#include <unistd.h>
-
 #include <cstdlib>
 #include <cstdio>
 
 #include "support/log_capture.h"
-
-extern char **environ;
+#include "support/run_argv.h"
 
 namespace tvxtest {
 
 namespace {
 
-// Run runs argv (searched in PATH) with standard output and error into
-// `out`, since fsck.fat reports some findings on either; the exit status, -1
-// when it could not run.
-int Run(const std::vector<std::string> &argv, std::string *out) {
-  // mtools refuses images whose geometry it doubts unless told not to.
-  setenv("MTOOLS_SKIP_CHECK", "1", 1);
-  int fds[2];
-  if (pipe(fds) != 0) return -1;
-  posix_spawn_file_actions_t actions;
-  posix_spawn_file_actions_init(&actions);
-  posix_spawn_file_actions_adddup2(&actions, fds[1], 1);
-  posix_spawn_file_actions_adddup2(&actions, fds[1], 2);
-  posix_spawn_file_actions_addclose(&actions, fds[0]);
-  std::vector<char *> args;
-  for (const std::string &a : argv) args.push_back(const_cast<char *>(a.c_str()));
-  args.push_back(nullptr);
-  pid_t pid = -1;
-  int rc = posix_spawnp(&pid, args[0], &actions, nullptr, args.data(), environ);
-  posix_spawn_file_actions_destroy(&actions);
-  close(fds[1]);
-  char buf[4096];
-  ssize_t n;
-  while ((n = read(fds[0], buf, sizeof buf)) > 0) out->append(buf, static_cast<size_t>(n));
-  close(fds[0]);
-  if (rc != 0) return -1;
-  int status = 0;
-  if (waitpid(pid, &status, 0) != pid) return -1;
-  return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
-}
+// mtools refuses images whose geometry it doubts unless told not to; every
+// mtools run of the test process (here and in the tests) wants that.
+[[maybe_unused]] const int kMtoolsSkipCheck = setenv("MTOOLS_SKIP_CHECK", "1", 1);
 
 }  // namespace
 
 std::string FatProblems(const std::string &image) {
   std::string out;
-  int status = Run({"fsck.fat", "-n", image}, &out);
+  int status = RunArgv({"fsck.fat", "-n", image}, &out, {.withStderr = true});
   bool clean = status == 0;
   for (const char *bad : {"ong file", "rror", "ree cluster", "Fix", "Unrecover", "orrect",
                           "Duplicate", "Bad", "claimed", "truncat"}) {
@@ -61,7 +30,7 @@ std::string FatProblems(const std::string &image) {
 std::set<std::string> MtoolsNames(const std::string &image) {
   std::string out;
   std::set<std::string> names;
-  if (Run({"mdir", "-b", "-i", image, "::/"}, &out) != 0) return names;
+  if (RunArgv({"mdir", "-b", "-i", image, "::/"}, &out, {.withStderr = true}) != 0) return names;
   size_t start = 0;
   while (start < out.size()) {
     size_t end = out.find('\n', start);
@@ -75,7 +44,7 @@ std::set<std::string> MtoolsNames(const std::string &image) {
 bool MtoolsRead(const std::string &image, const std::string &name, std::string *data) {
   TempDir t;
   std::string path = t.Join("out"), log;
-  if (Run({"mcopy", "-n", "-i", image, "::/" + name, path}, &log) != 0) return false;
+  if (RunArgv({"mcopy", "-n", "-i", image, "::/" + name, path}, &log, {.withStderr = true}) != 0) return false;
   *data = ReadFileOrDie(path);
   return true;
 }
@@ -84,7 +53,7 @@ bool MtoolsWrite(const std::string &image, const std::string &name, const std::s
   TempDir t;
   std::string path = t.Join("in"), log;
   WriteFileOrDie(path, data);
-  return Run({"mcopy", "-o", "-i", image, path, "::/" + name}, &log) == 0;
+  return RunArgv({"mcopy", "-o", "-i", image, path, "::/" + name}, &log, {.withStderr = true}) == 0;
 }
 
 unsigned long TestFloppy::Open(const std::string &path, bool format) {

@@ -5,6 +5,8 @@
 #include <string>
 #include <vector>
 
+#include "support/run_argv.h"
+
 namespace tvxtest {
 
 // TestCertDir is the certificate directory the library was built to trust,
@@ -21,10 +23,5 @@ inline constexpr const char *kPkiSigners[] = {"maker",   "partner", "stranger", 
 // `pkiDir`, detached or with the content embedded; empty on failure.
 std::string Sign(const std::string &pkiDir, const std::string &signer, const std::string &data,
                  bool embed);
-
-// RunArgv runs a program without a shell and returns its exit status (-1
-// when it could not run or died of a signal); `out` (optional) collects its
-// standard output.
-int RunArgv(const std::vector<std::string> &argv, std::string *out = nullptr);
 
 }  // namespace tvxtest
