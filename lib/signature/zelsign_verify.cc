@@ -18,8 +18,20 @@ struct X509RefsDeleter {
 using X509Refs = std::unique_ptr<STACK_OF(X509), X509RefsDeleter>;
 
 bool Attempt(PKCS7 *p7, STACK_OF(X509) * certs, X509_STORE *store, BIO *data, BIO *out, int flags) {
-  // Every attempt reads the detached content from its start.
-  if (data != nullptr) (void)BIO_reset(data);
+  if (data != nullptr) {
+    // Every attempt reads the detached content from its start.
+    (void)BIO_reset(data);
+    // PKCS7_verify reads a memory BIO through a temporary copy, which OpenSSL
+    // 3.0 leaks when it cannot set up the signature's digests. Set them up
+    // here first, and stop where that would fail.
+    BIO *chain = PKCS7_dataInit(p7, data);
+    if (chain == nullptr) return false;
+    while (chain != nullptr && chain != data) {
+      BIO *next = BIO_pop(chain);
+      BIO_free(chain);
+      chain = next;
+    }
+  }
   return PKCS7_verify(p7, certs, store, data, out, flags) > 0;
 }
 
@@ -147,20 +159,11 @@ uint32_t VerifyStatus(PKCS7 *p7, const void *data, size_t len, X509_STORE *store
       SetError(err, kNoReason);
       return ZELSIGN_ERROR;
     }
-    UniquePtr<BIO> mem(BIO_new_mem_buf(data, static_cast<int>(len)));
-    if (mem == nullptr) {
+    bio.reset(BIO_new_mem_buf(data, static_cast<int>(len)));
+    if (bio == nullptr) {
       SetError(err, ReasonText(ERR_get_error()));
       return ZELSIGN_ERROR;
     }
-    // PKCS7_verify copies the content of a memory BIO into a temporary BIO,
-    // which OpenSSL 3.0 leaks when the signature's digests cannot be set up.
-    // Behind a pass-through filter the data is read where it lies.
-    bio.reset(BIO_new(BIO_f_null()));
-    if (bio == nullptr) {
-      SetError(err, "out of memory");
-      return ZELSIGN_ERROR;
-    }
-    BIO_push(bio.get(), mem.release());
   }
   return Verify(p7, bio.get(), store, files, err, makerRefusal);
 }

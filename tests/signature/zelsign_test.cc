@@ -50,6 +50,37 @@ class ZelSignTest : public testing::Test {
       sigs_[s] = tvxtest::Sign(certDir_, s, kData, false);
       sigs_[std::string(s) + "+"] = tvxtest::Sign(certDir_, s, kData, true);
     }
+    // Two signers with two digest algorithms: PKCS7_verify then chains two
+    // digest BIOs in front of the content (where a leak once hid).
+    std::string in = tmp_->Join("data"), one = tmp_->Join("one.der"), two = tmp_->Join("two");
+    std::string s = certDir_ + "signers/";
+    tvxtest::WriteFileOrDie(in, kData);
+    tvxtest::RunArgv({"openssl", "cms", "-sign", "-binary", "-noattr", "-in", in, "-md", "sha256",
+                      "-signer", s + "maker.pem", "-inkey", s + "maker.key", "-outform", "DER",
+                      "-out", one});
+    tvxtest::RunArgv({"openssl",
+                      "cms",
+                      "-resign",
+                      "-binary",
+                      "-noattr",
+                      "-inform",
+                      "DER",
+                      "-in",
+                      one,
+                      "-content",
+                      in,
+                      "-md",
+                      "sha512",
+                      "-signer",
+                      s + "partner.pem",
+                      "-inkey",
+                      s + "partner.key",
+                      "-outform",
+                      "DER",
+                      "-out",
+                      two + ".der"});
+    tvxtest::RunArgv({"openssl", "pkcs7", "-inform", "DER", "-in", two + ".der", "-out", two});
+    sigs_["two digests"] = tvxtest::ReadFileOrDie(two);
   }
   static void TearDownTestSuite() { delete tmp_; }
   void SetUp() override {
@@ -92,6 +123,8 @@ TEST_F(ZelSignTest, StatusMatrix) {
       {"chain of depth 5", "deep", kOwn, kDefault, false, ZELSIGN_TRX_SIGNED, nullptr},
       {"untrusted chain of depth 5", "deepstranger", kOwn, kDefault, false, ZELSIGN_INVALID_CERT,
        "certificate verify error (self-signed certificate in certificate chain)"},
+      {"two signers, one untrusted", "two digests", kOwn, kDefault, false, ZELSIGN_INVALID_CERT,
+       "certificate verify error (unable to get local issuer certificate)"},
       {"tampered data", "maker", kOwn, kDefault, true, ZELSIGN_INVALID_CERT, "signature failure*"},
       {"maker CRL missing", "maker", kNoMakerCrl, kDefault, false, ZELSIGN_TRX_SIGNED, nullptr},
       {"maker CRL missing: revocation unchecked", "revoked", kNoMakerCrl, kDefault, false,
