@@ -36,11 +36,10 @@ fi
 pki=$certs/signers
 sign() { "$src/scripts/make-test-pki" sign "$certs" "$@"; }
 
-# Every signer, detached and embedded, through signature verify.
+# One signer of each status through signature verify (the library's own
+# table holds every kind of signer).
 printf 'windows9-64 = "windows.iso"\n' >"$work/map.txt"
-for row in "maker:Tarvex Signed:0" "partner:Partner Signed:0" "stranger:Invalid Certificate:1" \
-           "expired:Tarvex Signed:0" "revoked:Invalid Certificate:1" "deep:Tarvex Signed:0" \
-           "deepstranger:Invalid Certificate:1"; do
+for row in "maker:Tarvex Signed:0" "partner:Partner Signed:0" "revoked:Invalid Certificate:1"; do
   IFS=: read -r who want code <<<"$row"
   sign "$who" "$work/map.txt" "$work/$who.sig"
   out=$("$tool" signature verify --data "$work/map.txt" "$work/$who.sig" 2>/dev/null)

@@ -215,17 +215,4 @@ TEST(GuessWindowsVista, HugeListIsCutToItsField) {
   EXPECT_EQ(std::string(r.languages).substr(0, 12), "aa-X1?aa-X2?");
 }
 
-TEST(GuessWindowsVista, OverwritesAFilledResultItRecognises) {
-  GuessMedium medium{};
-  ASSERT_TRUE(tvx::guess::OpenMedium(Image("server2019").c_str(), &medium));
-  GuessResult r{};
-  r.guestOS = "winXPPro";
-  tvx::guess::CopyField(r.versionText, "SP2");
-  EXPECT_TRUE(Guess_WindowsVistaAndNewer(&medium, &r));
-  EXPECT_STREQ(r.guestOS, "windows2019srv-64");
-  EXPECT_STREQ(r.versionText, "SP2");  // not a field of this family
-  EXPECT_STREQ(r.editions, kServer2019);
-  tvx::guess::CloseMedium(&medium);
-}
-
 }  // namespace

@@ -10,6 +10,7 @@
 #include <string>
 
 #include "lib/guessGuest/guess_internal.h"
+#include "platform/guestos.h"
 #include "support/log_capture.h"
 #include "tvx_guess.h"
 
@@ -47,6 +48,9 @@ inline void ExpectGuess(const GuessRow &row, const GuessExtras &x = {}) {
   ASSERT_NE(rc, 2) << "the image did not open";
   EXPECT_EQ(rc, row.guestOS != nullptr ? 0 : 1);
   EXPECT_STREQ(r.guestOS, row.guestOS);
+  if (r.guestOS != nullptr) {
+    EXPECT_NE(GuestOS_GetOSIDByName(r.guestOS), GUESTOS_ID_UNKNOWN) << "not in the guest table";
+  }
   EXPECT_STREQ(r.guestOSOverride, row.override);
   EXPECT_EQ(r.version, row.version) << Guess_GetSubString(static_cast<GuessVersion>(r.version));
   EXPECT_EQ(r.noIsolinuxConfig != 0, row.noIsolinux);

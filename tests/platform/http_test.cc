@@ -11,12 +11,6 @@ namespace {
 
 using tvxtest::HttpServer;
 
-std::string Pattern(size_t n) {
-  std::string s(n, '\0');
-  for (size_t i = 0; i < n; i++) s[i] = static_cast<char>('a' + (i * 7 + i / 26) % 26);
-  return s;
-}
-
 struct Client {
   HttpConnection *conn = nullptr;
   explicit Client(const std::string &url, unsigned attempts = 4, unsigned timeoutMs = 15000) {
@@ -29,7 +23,7 @@ struct Client {
 // exactly the asked bytes, and a range past the end must not pass as data.
 TEST(Http, RangesFromARealWebServer) {
   tvxtest::TempDir root;
-  std::string image = Pattern(100000);
+  std::string image = tvxtest::Bytes(100000);
   tvxtest::WriteFileOrDie(root.Join("linux.iso"), image);
   tvxtest::WebServer server(root.Path());
   ASSERT_TRUE(server.Ok()) << "lighttpd did not start";
@@ -58,7 +52,7 @@ TEST(Http, RangesFromARealWebServer) {
 // Faults a real server does not produce: each must end in its own error,
 // never in a buffer silently filled with the wrong bytes.
 TEST(Http, MisbehavingServersAreReported) {
-  std::string image = Pattern(16384);
+  std::string image = tvxtest::Bytes(16384);
   struct Case {
     HttpServer::Mode mode;
     const char *path;
@@ -87,22 +81,10 @@ TEST(Http, MisbehavingServersAreReported) {
   }
 }
 
-// A server that ignores Range is still usable for a read from the start (a
-// small companion file), and the rest of its answer is not taken.
-TEST(Http, WholeFileAnswerServesAReadAtOffsetZero) {
-  std::string image = Pattern(50000);
-  HttpServer server({{"/f", image}}, HttpServer::Mode::kIgnoreRanges);
-  std::string url = server.Url("/f");
-  Client c(url);
-  std::string buf(1000, '\0');
-  ASSERT_EQ(Http_Read(c.conn, url.c_str(), 0, buf.data(), buf.size(), nullptr, nullptr), HTTP_OK);
-  EXPECT_EQ(buf, image.substr(0, 1000));
-}
-
 // A size that the server promises but does not deliver shows up as a short
 // read of the bytes past the real end.
 TEST(Http, ServerLyingAboutTheSizeGivesShortReads) {
-  std::string image = Pattern(8192);
+  std::string image = tvxtest::Bytes(8192);
   HttpServer server({{"/f", image}}, HttpServer::Mode::kLieSize);
   std::string url = server.Url("/f");
   Client c(url);

@@ -25,8 +25,4 @@ TEST(Log, LongMessagesAreNotCut) {
   EXPECT_EQ(cap.Lines()[0].size(), 5001u);
 }
 
-TEST(LogDeathTest, NotReachedNamesSourceAndLine) {
-  EXPECT_DEATH(NOT_REACHED_AT("lib/guessGuest/guess"), "NOT_REACHED lib/guessGuest/guess:[0-9]+");
-}
-
 }  // namespace

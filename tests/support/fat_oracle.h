@@ -31,7 +31,4 @@ struct TestFloppy {
   ~TestFloppy() { Close(); }
 };
 
-// Bytes gives `n` bytes of a pattern that differs with `seed`.
-std::string Bytes(size_t n, int seed);
-
 }  // namespace tvxtest

@@ -47,5 +47,7 @@ class TempDir {
 // Whole-file helpers for fixtures.
 std::string ReadFileOrDie(const std::string &path);
 void WriteFileOrDie(const std::string &path, const std::string &content);
+// Bytes gives `n` bytes of a pattern that differs with `seed`.
+std::string Bytes(size_t n, int seed = 0);
 
 }  // namespace tvxtest

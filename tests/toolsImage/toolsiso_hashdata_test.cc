@@ -20,12 +20,6 @@ using tvxtest::PutLe;
 
 constexpr uint32_t kBlock = 4096;
 
-std::string Image(size_t size) {
-  std::string image(size, '\0');
-  for (size_t i = 0; i < size; i++) image[i] = static_cast<char>((i * 131 + i / 4096) & 0xff);
-  return image;
-}
-
 uint8_t *MallocCopy(const std::string &s) {
   auto *p = static_cast<uint8_t *>(std::malloc(s.size() + 1));
   std::memcpy(p, s.data(), s.size());
@@ -42,7 +36,7 @@ std::string Base64(const std::string &bytes) {
 }
 
 TEST(ToolsIsoParseHashData, EveryCheckInOrder) {
-  const std::string image = Image(2 * kBlock + 1808);
+  const std::string image = tvxtest::Bytes(2 * kBlock + 1808);
   const std::string plain = tvxtest::BuildHashData(image);  // 608 bytes: 512 + 3 hashes
   const std::string embedded = tvxtest::BuildHashData(image, {kBlock, 64});  // + 64 for a signature
   ASSERT_EQ(plain.size(), 608u);
@@ -149,7 +143,7 @@ std::string Mismatch(const std::string &good, const std::string &bad, uint64_t b
 // first, a middle and the short last block; ranges that cross blocks, stop
 // early or run past the table.
 TEST(ToolsIsoVerifyHashes, FlippedBytesAndRanges) {
-  const std::string image = Image(3 * kBlock + 1000);
+  const std::string image = tvxtest::Bytes(3 * kBlock + 1000);
   std::string hd = tvxtest::BuildHashData(image);
   ToolsIsoHashInfo *info = ToolsISO_ParseHashData(MallocCopy(hd), hd.size());
   ASSERT_NE(info, nullptr);

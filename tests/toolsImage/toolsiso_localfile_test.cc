@@ -28,19 +28,13 @@ using tvxtest::ReadFileOrDie;
 using tvxtest::TempDir;
 using tvxtest::WriteFileOrDie;
 
-std::string Pattern(size_t n, unsigned seed) {
-  std::string s(n, '\0');
-  for (size_t i = 0; i < n; i++) s[i] = static_cast<char>((i * 131 + seed * 7 + i / 251) & 0xff);
-  return s;
-}
-
 // A tools tree with a manifest and a file of many blocks, mastered with
 // Rock Ridge and Joliet names.
 std::string MasterIso(const TempDir &dir, const std::string &name) {
   std::string tree = dir.Join("tree-" + name);
   std::filesystem::create_directories(tree + "/vmtools");
   WriteFileOrDie(tree + "/manifest.txt", "tools.version = \"12.1.0\"\n");
-  WriteFileOrDie(tree + "/vmtools/payload.bin", Pattern(150001, 3));
+  WriteFileOrDie(tree + "/vmtools/payload.bin", tvxtest::Bytes(150001, 3));
   std::string iso = dir.Join(name);
   int rc = tvxtest::RunArgv({"xorriso", "-as", "mkisofs", "-quiet", "-R", "-J", "-o", iso, tree});
   EXPECT_EQ(rc, 0);
@@ -274,7 +268,7 @@ TEST_F(ToolsImageRead, IsoReaderOverVerifiedCallbacks) {
     const char *path;
     std::string want;
   } files[] = {{"manifest.txt", "tools.version = \"12.1.0\"\n"},
-               {"vmtools/payload.bin", Pattern(150001, 3)}};
+               {"vmtools/payload.bin", tvxtest::Bytes(150001, 3)}};
   auto readAll = [&](const char *path, std::string *out) {
     ToolsIsoLocalFile *h = OpenOk(iso);
     Iso9660Image *image = nullptr;
@@ -307,7 +301,7 @@ TEST_F(ToolsImageRead, IsoReaderOverVerifiedCallbacks) {
   // Tamper with the middle of the payload: the payload fails, the manifest
   // (in other blocks) still reads.
   std::string bytes = ReadFileOrDie(iso);
-  size_t at = bytes.find(Pattern(150001, 3).substr(70000, 64));
+  size_t at = bytes.find(tvxtest::Bytes(150001, 3).substr(70000, 64));
   ASSERT_NE(at, std::string::npos);
   FlipByte(iso, at);
   std::string got;
