@@ -46,19 +46,6 @@ TEST(StrUtil, TokenIndexPastEndIsSafe) {
 }
 
 TEST(StrUtil, IntTokensAreWholeNumbersOnly) {
-  // The way the recognisers read "VERSION 11.0": the key, then two numbers.
-  const char *line = "VERSION 11.0";
-  unsigned int index = 0;
-  char *key = StrUtil_GetNextToken(&index, line, " \n");
-  ASSERT_STREQ(key, "VERSION");
-  std::free(key);
-  int32_t major = -1, minor = -1;
-  EXPECT_TRUE(StrUtil_GetNextIntToken(&major, &index, line, "."));
-  EXPECT_TRUE(StrUtil_GetNextIntToken(&minor, &index, line, "."));
-  EXPECT_EQ(major, 11);
-  EXPECT_EQ(minor, 0);
-  EXPECT_FALSE(StrUtil_GetNextIntToken(&minor, &index, line, "."));
-
   struct Case {
     const char *text;
     bool ok;
@@ -154,19 +141,6 @@ TEST(Str, SnprintfReportsCuts) {
 TEST(StrDeathTest, SprintfPanicsOnCut) {
   char buf[4];
   EXPECT_DEATH(Str_Sprintf(buf, sizeof buf, "%s", "toolong"), "Str_Sprintf");
-}
-
-TEST(StrUtil, AffixTests) {
-  EXPECT_TRUE(StrUtil_StartsWith("install_x.clg", "install_"));
-  EXPECT_FALSE(StrUtil_StartsWith("Install_x.clg", "install_"));
-  EXPECT_TRUE(StrUtil_CaselessStartsWith("WinXPPro", "winxp"));
-  EXPECT_FALSE(StrUtil_StartsWith("in", "install_"));
-  EXPECT_TRUE(StrUtil_EndsWith("install_x.clg", ".clg"));
-  EXPECT_FALSE(StrUtil_EndsWith("g", ".clg"));
-  EXPECT_TRUE(StrUtil_CaselessEndsWith("ISOLINUX.CFG", ".cfg"));
-  char text[] = "MiXeD 1";
-  EXPECT_STREQ(Str_ToUpper(text), "MIXED 1");
-  EXPECT_STREQ(Str_ToLower(text), "mixed 1");
 }
 
 }  // namespace
