@@ -66,10 +66,12 @@ TVX_EXPORT uint32_t ToolsVersion_GetStatusReport(const char *configPath, Diction
                                                  const char *guestManifestPath,
                                                  const char *guestManifestText,
                                                  uint32_t toolsVersion, int32_t mode,
+                                                 const char *certFile,
                                                  ToolsVersionReport **out_report) {
   if (out_report != nullptr) *out_report = nullptr;
   try {
     tvx::toolsversion::Report report;
+    report.certFile = certFile;
     // A missing configuration reads as an empty one: no guest OS, no files.
     tvx::toolsversion::DictPtr empty(config == nullptr ? Dictionary_Create() : nullptr);
     if (config == nullptr) config = empty.get();
@@ -88,7 +90,7 @@ TVX_EXPORT uint32_t ToolsVersion_GetStatus(const char *configPath, Dictionary *c
                                            const char *guestManifestText, uint32_t toolsVersion,
                                            int32_t mode) {
   return ToolsVersion_GetStatusReport(configPath, config, guestManifestPath, guestManifestText,
-                                      toolsVersion, mode, nullptr);
+                                      toolsVersion, mode, nullptr, nullptr);
 }
 
 TVX_EXPORT void ToolsVersion_FreeReport(ToolsVersionReport *report) {

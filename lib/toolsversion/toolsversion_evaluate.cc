@@ -139,7 +139,8 @@ ToolsComponentStatus RateComponent(const ComponentInfo &c) {
 uint32_t EvaluateManifests(const char *hostPath, const char *avrPath, const Dictionary *guest,
                            Report *report) {
   LogSwitches switches;
-  TablePtr table = LoadManifests(hostPath, avrPath, guest, &switches);
+  TablePtr table = LoadManifests(hostPath, avrPath, guest, &switches,
+                                 report != nullptr ? report->certFile : nullptr);
   if (table == nullptr) return TOOLS_STATUS_UNKNOWN;
   return EvaluateTable(table.get(), switches, report);
 }

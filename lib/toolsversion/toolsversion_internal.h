@@ -83,7 +83,7 @@ TablePtr FillTable(const Dictionary *host, const Dictionary *avr, const Dictiona
 // manifest (optional path; checked against its ".sig") and the guest
 // dictionary (optional). Null when the host manifest cannot be loaded.
 TablePtr LoadManifests(const char *hostPath, const char *avrPath, const Dictionary *guest,
-                       LogSwitches *switches);
+                       LogSwitches *switches, const char *certFile = nullptr);
 
 // --- Status ----------------------------------------------------------------
 
@@ -96,6 +96,9 @@ struct ComponentRow {
 
 // What one status call found, for ToolsVersion_GetStatusReport.
 struct Report {
+  // In: the maker certificates to trust for the image and the AVR manifest
+  // (null: the installed ones).
+  const char *certFile = nullptr;
   bool evaluated = false;
   uint32_t manifestStatus = TOOLS_STATUS_UNKNOWN;
   bool savedStatus = false;

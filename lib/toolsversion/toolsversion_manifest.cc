@@ -199,7 +199,7 @@ void WalkManifest(const Dictionary *dict, HashTable *table, ToolsManifestKind ki
 
 // LoadAvr loads the AVR manifest once its detached signature holds; null
 // (logged) otherwise.
-DictPtr LoadAvr(const char *avrPath) {
+DictPtr LoadAvr(const char *avrPath, const char *certFile) {
   char *raw = nullptr;
   size_t size = 0;
   if (!ToolsISO_ReadFile(avrPath, &raw, &size)) {
@@ -215,7 +215,7 @@ DictPtr LoadAvr(const char *avrPath) {
     return nullptr;
   }
   CharPtr sig(rawSig);
-  if (!ToolsISO_VerifySignature(nullptr, sig.get(), sigSize, data.get(), size)) {
+  if (!ToolsISO_VerifySignature(certFile, sig.get(), sigSize, data.get(), size)) {
     TV_LOG("Error signature check failed for AVR manifest '%s'.\n", avrPath);
     return nullptr;
   }
@@ -251,7 +251,7 @@ TablePtr FillTable(const Dictionary *host, const Dictionary *avr, const Dictiona
 }
 
 TablePtr LoadManifests(const char *hostPath, const char *avrPath, const Dictionary *guest,
-                       LogSwitches *switches) {
+                       LogSwitches *switches, const char *certFile) {
   UniquePtr<MsgList> messages;
   DictPtr host = LoadDictionary(hostPath, nullptr, 0, &messages);
   if (host == nullptr) {
@@ -261,7 +261,7 @@ TablePtr LoadManifests(const char *hostPath, const char *avrPath, const Dictiona
   }
   DictPtr avr;
   if (avrPath != nullptr) {
-    avr = LoadAvr(avrPath);
+    avr = LoadAvr(avrPath, certFile);
     if (avr == nullptr) TV_LOG("AVR file corrupted, ignoring AVR values\n");
   }
   return FillTable(host.get(), avr.get(), guest, switches);

@@ -159,7 +159,7 @@ static void TestToolsVersion(void) {
   CHECK(!Dictionary_LoadEx(config, "/nonexistent/tvx-vm.tvx", NULL));
   CHECK(ToolsVersion_GetStatus("/nonexistent/vm.tvx", config, NULL, "", 10252, 5) ==
         TOOLS_STATUS_NOT_APPLICABLE);
-  CHECK(ToolsVersion_GetStatusReport("/nonexistent/vm.tvx", config, NULL, "", 0, 0, &report) ==
+  CHECK(ToolsVersion_GetStatusReport("/nonexistent/vm.tvx", config, NULL, "", 0, 0, NULL, &report) ==
         TOOLS_STATUS_NOT_INSTALLED);
   CHECK(report != NULL && report->status == TOOLS_STATUS_NOT_INSTALLED && !report->evaluated);
   ToolsVersion_FreeReport(report);

@@ -149,7 +149,7 @@ TEST_F(ToolsVersionImage, GuestAgainstSignedImageAndAvr) {
     tvxtest::LogCapture log;
     ToolsVersionReport *report = nullptr;
     ToolsVersion_GetStatusReport(dir_.Join("vm.tvx").c_str(), config_, nullptr, c.guest, 12000,
-                                 0, &report);
+                                 0, nullptr, &report);
     ASSERT_NE(report, nullptr);
     // A failed fetch is retried with the legacy number, which fails alike.
     EXPECT_EQ(report->manifestStatus, c.status);
