@@ -184,7 +184,8 @@ bool SaveXmlInfo(const char *configPath, const char *updateAgentXml, const char 
   if (IsEmpty(updateAgentXml) && IsEmpty(manifestText) && updateCounter == 0) return true;
 
   UniquePtr<MsgList> messages;
-  DictPtr config = LoadDictionary(configPath, nullptr, 0, &messages);
+  DictPtr config =
+      configPath != nullptr ? LoadDictionary(configPath, nullptr, 0, &messages) : nullptr;
   if (config == nullptr) {
     TV_LOG("Error loading dictionary for tvxx config file.");
     MsgList_Log(messages.get());

@@ -118,7 +118,8 @@ uint32_t GetStatus(const char *configPath, Dictionary *config, const char *guest
   if (mode == 2) {
     CharPtr guestOS(Dict_GetString(config, nullptr, "guestOS"));
     if (guestOS == nullptr) {
-      TV_LOG("Failed to find guestOS value from tvxx config file '%s'.\n", configPath);
+      TV_LOG("Failed to find guestOS value from tvxx config file '%s'.\n",
+             configPath != nullptr ? configPath : "");
     } else if (GuestOS_IsOrka(MapGuestOS(guestOS.get()))) {
       return TOOLS_STATUS_NOT_APPLICABLE;
     }
