@@ -10,7 +10,6 @@
 #include <string>
 
 #include "fuzz/split_input.h"
-
 #include "lib/toolsversion/toolsversion_xml.h"
 #include "platform/file.h"
 #include "tvx_log.h"

@@ -125,12 +125,12 @@ std::string ReportJson(const ToolsVersionReport &r) {
 }
 
 void PrintComponents(const ToolsVersionReport &r) {
-  std::printf("  %-24s %-24s %-14s %s %-14s %-14s %-14s %s\n", "component", "rating", "guest",
-              "I", "host", "AVR min", "AVR max", "AVR illegal");
+  std::printf("  %-24s %-24s %-14s %s %-14s %-14s %-14s %s\n", "component", "rating", "guest", "I",
+              "host", "AVR min", "AVR max", "AVR illegal");
   auto row = [](const ToolsVersionComponent &c) {
     std::printf("  %-24s %-24s %-14s %c %-14s %-14s %-14s %s\n", c.name,
-                ToolsVersion_ComponentStatusText(c.rating), c.guestVersion,
-                c.installed ? 'Y' : 'N', c.hostVersion, c.avrMin, c.avrMax, c.avrIllegal);
+                ToolsVersion_ComponentStatusText(c.rating), c.guestVersion, c.installed ? 'Y' : 'N',
+                c.hostVersion, c.avrMin, c.avrMax, c.avrIllegal);
   };
   row(r.monolithic);
   for (size_t i = 0; i < r.numComponents; i++) row(r.components[i]);
@@ -180,11 +180,10 @@ int Status(const std::vector<std::string> &args) {
   ToolsVersionReport *report = nullptr;
   {
     LogLines log;
-    ToolsVersion_GetStatusReport(config.c_str(), dict, guestManifest.empty() ? nullptr
-                                                                             : guestManifest.c_str(),
-                                 nullptr, static_cast<uint32_t>(toolsVersion),
-                                 static_cast<int32_t>(mode), cert.empty() ? nullptr : cert.c_str(),
-                                 &report);
+    ToolsVersion_GetStatusReport(config.c_str(), dict,
+                                 guestManifest.empty() ? nullptr : guestManifest.c_str(), nullptr,
+                                 static_cast<uint32_t>(toolsVersion), static_cast<int32_t>(mode),
+                                 cert.empty() ? nullptr : cert.c_str(), &report);
   }
   Dictionary_Free(dict);
   if (report == nullptr) return 70;

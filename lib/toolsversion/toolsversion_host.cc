@@ -3,12 +3,12 @@
 // manifest from an image whose hash data or signature fails is never used),
 // and the signed AVR manifest beside the image.
 #include "lib/toolsversion/toolsversion_internal.h"
-#include "tvx_toolsiso.h"
-#include "tvx_toolsiso_image.h"
 #include "platform/file.h"
 #include "platform/str.h"
 #include "platform/vthread.h"
 #include "tvx_iso9660.h"
+#include "tvx_toolsiso.h"
+#include "tvx_toolsiso_image.h"
 
 namespace tvx::toolsversion {
 

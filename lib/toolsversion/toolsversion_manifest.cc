@@ -5,11 +5,11 @@
 #include <cstring>
 
 #include "lib/toolsversion/toolsversion_internal.h"
-#include "tvx_toolsiso.h"
-#include "tvx_toolsiso_image.h"
 #include "platform/ascii.h"
 #include "platform/msglist.h"
 #include "platform/str.h"
+#include "tvx_toolsiso.h"
+#include "tvx_toolsiso_image.h"
 
 namespace tvx::toolsversion {
 
@@ -116,8 +116,8 @@ ComponentInfo *LookupComponent(HashTable *table, const char *name) {
   return HashTable_Lookup(table, name, &data) ? static_cast<ComponentInfo *>(data) : nullptr;
 }
 
-void HandleEntry(HashTable *table, ToolsManifestKind kind, LogSwitches *switches,
-                 const char *name, const char *value) {
+void HandleEntry(HashTable *table, ToolsManifestKind kind, LogSwitches *switches, const char *name,
+                 const char *value) {
   auto reject = [&](const char *message) {
     if (switches != nullptr) TV_LOG("%s: %s = %s\n", message, name, value);
   };
@@ -169,9 +169,9 @@ void HandleEntry(HashTable *table, ToolsManifestKind kind, LogSwitches *switches
     }
   }
   ToolsVersionNumber *field = suffix == Suffix::kVersionMax ? &info->avrMax
-                              : kind == MANIFEST_HOST      ? &info->versionOnHost
-                              : kind == MANIFEST_GUEST     ? &info->versionInGuest
-                                                           : &info->avrMin;
+                              : kind == MANIFEST_HOST       ? &info->versionOnHost
+                              : kind == MANIFEST_GUEST      ? &info->versionInGuest
+                                                            : &info->avrMin;
   if (IsSet(*field)) return reject("Multiple identical entries");
   const char *end = ParseVersion(value, field);
   if (end == nullptr || !OnlyBlanksLeft(end)) reject("Cannot parse version");

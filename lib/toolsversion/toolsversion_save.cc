@@ -2,11 +2,11 @@
 // extended config file and rewrites it whole. The document is edited in
 // memory; the file changes only at the very end, through the crash-safe
 // replace, so any failure before or during the write leaves it as it was.
-#include <cerrno>
-#include <cstring>
-
 #include <libxml/parser.h>
 #include <libxml/tree.h>
+
+#include <cerrno>
+#include <cstring>
 
 #include "lib/toolsversion/toolsversion_xml.h"
 #include "platform/ascii.h"
@@ -158,16 +158,19 @@ bool WriteDocument(xmlDoc *doc, const std::string &path) {
   options.mustExist = true;
   bool filled = false;
   int writeErrno = 0, err = 0;
-  Bool ok = File_ReplaceWith(path.c_str(), options, [&](int fd, const char *) {
-    filled = true;
-    if (WriteAll(fd, out.get(), static_cast<size_t>(size))) return true;
-    writeErrno = errno;
-    return false;
-  }, &err);
+  Bool ok = File_ReplaceWith(
+      path.c_str(), options,
+      [&](int fd, const char *) {
+        filled = true;
+        if (WriteAll(fd, out.get(), static_cast<size_t>(size))) return true;
+        writeErrno = errno;
+        return false;
+      },
+      &err);
   if (!ok) {
     if (filled) {
-      TV_LOG("Error writing to extended config file: errcode %d.\n", writeErrno != 0 ? writeErrno
-                                                                                     : err);
+      TV_LOG("Error writing to extended config file: errcode %d.\n",
+             writeErrno != 0 ? writeErrno : err);
     } else {
       TV_LOG("Error opening extended config file for writing: errcode %d.\n", err);
     }
@@ -207,8 +210,8 @@ bool SaveXmlInfo(const char *configPath, const char *updateAgentXml, const char 
 
   if (!IsEmpty(updateAgentXml) && std::strcmp(updateAgentXml, "null") != 0) {
     if (std::strcmp(updateAgentXml, "no tools") == 0) {
-      while (xmlNode *tools = agentInfo != nullptr ? FirstChildNamed(agentInfo, "tools")
-                                                   : nullptr) {
+      while (xmlNode *tools =
+                 agentInfo != nullptr ? FirstChildNamed(agentInfo, "tools") : nullptr) {
         RemoveNode(tools);
       }
       RemoveNode(manifest);
