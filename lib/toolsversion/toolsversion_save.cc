@@ -104,7 +104,8 @@ Bool AddManifestEntry(const char *name, const char *value, void *ctx) {
   std::string component = dot != nullptr ? std::string(name, dot) : std::string(name);
   std::string suffix = dot != nullptr ? std::string(dot + 1) : std::string();
   if (dot != nullptr && ascii::Equal(suffix, "encoding")) return TRUE;
-  if (xmlValidateName(X(component.c_str()), 0) != 0 || !IsXmlText(value)) {
+  if (!IsXmlText(component) || xmlValidateName(X(component.c_str()), 0) != 0 ||
+      !IsXmlText(value)) {
     TV_LOG("Skipping manifest entry '%s': not representable in XML.\n", name);
     return TRUE;
   }

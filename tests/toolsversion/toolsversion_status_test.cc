@@ -216,6 +216,16 @@ TEST_F(ToolsVersionStatus, SaveMergesAndReadsBack) {
   EXPECT_EQ(XPath(xml, "/vm/update-agent-info/drivers"), "1:");
   EXPECT_EQ(XPath(xml, "/vm/tools-manifest"), "0:");
   EXPECT_EQ(XPath(xml, "/vm/keep"), "1:x");
+
+  // Entries that XML cannot carry are skipped: written, they would make the
+  // whole file unreadable.
+  tvxtest::LogCapture log;
+  ASSERT_TRUE(ToolsVersion_SaveXmlInfo(
+      cfg.c_str(), nullptr, "a\xf0\x9a = 1\nb.version = \"\\x01\"\nc.version = 2\n", 0, 0));
+  EXPECT_EQ(XPath(Xml(), "/vm/tools-manifest/*/@version"), "1:2");
+  EXPECT_TRUE(
+      log.Contains("ToolsVersion: Skipping manifest entry 'b.version': not representable "
+                   "in XML.\n"));
 }
 
 TEST_F(ToolsVersionStatus, FailedSaveLeavesTheFileAsItWas) {
