@@ -32,6 +32,7 @@ struct Files {
     std::fclose(f);
     Tvx_SetLogSink(Quiet, nullptr);
   }
+  ~Files() { File_DeleteDirectoryTree(dir.c_str()); }
 };
 
 }  // namespace
