@@ -4,7 +4,6 @@
 // digest; the ratio of the two throughputs is the figure to watch.
 // scripts/run-bench also times whole processes against `openssl dgst`.
 #include <benchmark/benchmark.h>
-
 #include <openssl/evp.h>
 
 #include <cstdlib>

@@ -67,7 +67,9 @@ CryptoError CryptoHash_FromString(const char *name, const CryptoHash **out_hash)
   if (name == nullptr) return CRYPTO_ERROR_UNKNOWN_ALGORITHM;
   for (const auto &h : kHashes) {
     bool match = tvx::ascii::Equal(h.name, name);
-    for (const char *alias : h.aliases) match = match || (alias != nullptr && tvx::ascii::Equal(alias, name));
+    for (const char *alias : h.aliases) {
+      match = match || (alias != nullptr && tvx::ascii::Equal(alias, name));
+    }
     if (match) {
       *out_hash = &h;
       return CRYPTO_ERROR_SUCCESS;

@@ -22,41 +22,39 @@ constexpr const char *kCheck = "hashdata check";
 constexpr uint64_t kMaxHashData = 256u << 20;  // as the library reads companions
 
 void PrintCreateHelp(FILE *out) {
-  std::fprintf(
-      out,
-      "Usage: tvxguest hashdata create --block-size N [--embed-signature] --key KEY\n"
-      "           --cert CERT [--sig SIG] [--quiet] IMAGE OUT\n\n"
-      "Hashes IMAGE block by block and writes the hash-data file OUT, signed with the\n"
-      "private key KEY. CERT holds the signing certificate, optionally followed by the\n"
-      "intermediate certificates that the signature should carry (PEM).\n\n"
-      "Options:\n"
-      "  --block-size N     image bytes per hash, 512 to 4096\n"
-      "  --embed-signature  put the signature at the end of OUT (else it goes to SIG)\n"
-      "  --sig SIG          the detached signature file (default: OUT with its\n"
-      "                     \".sha\" replaced by \".sig\", else OUT.sig)\n"
-      "  --quiet            no progress bar\n"
-      "  -h, --help         show this help\n\n"
-      "Exit status: 0 written, 1 failed, 64 usage error.\n");
+  std::fprintf(out,
+               "Usage: tvxguest hashdata create --block-size N [--embed-signature] --key KEY\n"
+               "           --cert CERT [--sig SIG] [--quiet] IMAGE OUT\n\n"
+               "Hashes IMAGE block by block and writes the hash-data file OUT, signed with the\n"
+               "private key KEY. CERT holds the signing certificate, optionally followed by the\n"
+               "intermediate certificates that the signature should carry (PEM).\n\n"
+               "Options:\n"
+               "  --block-size N     image bytes per hash, 512 to 4096\n"
+               "  --embed-signature  put the signature at the end of OUT (else it goes to SIG)\n"
+               "  --sig SIG          the detached signature file (default: OUT with its\n"
+               "                     \".sha\" replaced by \".sig\", else OUT.sig)\n"
+               "  --quiet            no progress bar\n"
+               "  -h, --help         show this help\n\n"
+               "Exit status: 0 written, 1 failed, 64 usage error.\n");
 }
 
 void PrintCheckHelp(FILE *out) {
-  std::fprintf(
-      out,
-      "Usage: tvxguest hashdata check [--json] [--cert CERT] [--sig SIG] [--quiet]\n"
-      "           HASHDATA IMAGE\n\n"
-      "Checks the hash-data file HASHDATA, its signature (embedded, or detached in SIG)\n"
-      "and every block of IMAGE against it, and reports the first bad block and how\n"
-      "many there are.\n\n"
-      "Options:\n"
-      "  --cert CERT  trust this certificate file instead of the installed maker\n"
-      "               certificates\n"
-      "  --sig SIG    the detached signature (default: HASHDATA with its \".sha\"\n"
-      "               replaced by \".sig\", else HASHDATA.sig)\n"
-      "  --json       print one JSON object\n"
-      "  --quiet      no progress bar\n"
-      "  -h, --help   show this help\n\n"
-      "Exit status: 0 all good, 1 bad signature or bad blocks, 2 HASHDATA refused or a\n"
-      "file unreadable, 64 usage error.\n");
+  std::fprintf(out,
+               "Usage: tvxguest hashdata check [--json] [--cert CERT] [--sig SIG] [--quiet]\n"
+               "           HASHDATA IMAGE\n\n"
+               "Checks the hash-data file HASHDATA, its signature (embedded, or detached in SIG)\n"
+               "and every block of IMAGE against it, and reports the first bad block and how\n"
+               "many there are.\n\n"
+               "Options:\n"
+               "  --cert CERT  trust this certificate file instead of the installed maker\n"
+               "               certificates\n"
+               "  --sig SIG    the detached signature (default: HASHDATA with its \".sha\"\n"
+               "               replaced by \".sig\", else HASHDATA.sig)\n"
+               "  --json       print one JSON object\n"
+               "  --quiet      no progress bar\n"
+               "  -h, --help   show this help\n\n"
+               "Exit status: 0 all good, 1 bad signature or bad blocks, 2 HASHDATA refused or a\n"
+               "file unreadable, 64 usage error.\n");
 }
 
 std::string CompanionSig(const std::string &path) {
@@ -111,17 +109,19 @@ int Create(const std::vector<std::string> &args) {
 
   std::string error, detached;
   std::unique_ptr<Signer> signer = Signer::Load(key, cert, &error);
-  std::string out = signer != nullptr ? CreateHashData(files[0], options, *signer, &detached, &error)
-                                      : std::string();
+  std::string out = signer != nullptr
+                        ? CreateHashData(files[0], options, *signer, &detached, &error)
+                        : std::string();
   bool ok = !out.empty() && WriteWhole(files[1], out, &error) &&
             (options.embedSignature || WriteWhole(sigPath, detached, &error));
   if (!ok) {
     std::fprintf(stderr, "tvxguest %s: %s\n", kCreate, error.c_str());
     return 1;
   }
-  std::printf("%s: %llu hashes of %u-byte blocks, signature %s\n", files[1].c_str(),
-              static_cast<unsigned long long>(Le(reinterpret_cast<const uint8_t *>(out.data()) + 72, 8)),
-              options.blockSize, options.embedSignature ? "embedded" : sigPath.c_str());
+  std::printf(
+      "%s: %llu hashes of %u-byte blocks, signature %s\n", files[1].c_str(),
+      static_cast<unsigned long long>(Le(reinterpret_cast<const uint8_t *>(out.data()) + 72, 8)),
+      options.blockSize, options.embedSignature ? "embedded" : sigPath.c_str());
   return 0;
 }
 
@@ -240,9 +240,9 @@ int Check(const std::vector<std::string> &args) {
     sigRead = ReadWhole(sigPath, kMaxHashData, &sig, &error);
   }
   size_t logged = g_lines.size();
-  bool sigOk = sigRead && ToolsISO_VerifySignature(cert.empty() ? nullptr : cert.c_str(),
-                                                   sig.data(), sig.size(), info->data,
-                                                   info->dataSize - sigSize);
+  bool sigOk =
+      sigRead && ToolsISO_VerifySignature(cert.empty() ? nullptr : cert.c_str(), sig.data(),
+                                          sig.size(), info->data, info->dataSize - sigSize);
   std::string sigError = !sigRead ? error : g_lines.size() > logged ? g_lines[logged] : "";
   if (!sigError.empty() && sigError.back() == '\n') sigError.pop_back();
   BlockReport r = CheckBlocks(info, files[1], quiet);

@@ -20,20 +20,19 @@ constexpr const char *kVerify = "signature verify";
 constexpr uint64_t kMaxData = 256u << 20;
 
 void PrintVerifyHelp(FILE *out) {
-  std::fprintf(
-      out,
-      "Usage: tvxguest signature verify [--data FILE] [--cert FILE] [--json] SIGNATURE\n\n"
-      "Checks the PEM PKCS#7 signature in SIGNATURE and prints its status: \"Tarvex\n"
-      "Signed\" (the maker's certificates), \"Partner Signed\", \"Invalid Certificate\"\n"
-      "(a signer that neither trusts, or content that does not match) or \"Error\".\n\n"
-      "Options:\n"
-      "  --data FILE  the signed content, for a detached signature (default: the\n"
-      "               content inside SIGNATURE)\n"
-      "  --cert FILE  trust this certificate file as the maker's instead of the\n"
-      "               installed one\n"
-      "  --json       print one JSON object\n"
-      "  -h, --help   show this help\n\n"
-      "Exit status: 0 maker or partner signed, 1 not trusted, 2 error, 64 usage error.\n");
+  std::fprintf(out,
+               "Usage: tvxguest signature verify [--data FILE] [--cert FILE] [--json] SIGNATURE\n\n"
+               "Checks the PEM PKCS#7 signature in SIGNATURE and prints its status: \"Tarvex\n"
+               "Signed\" (the maker's certificates), \"Partner Signed\", \"Invalid Certificate\"\n"
+               "(a signer that neither trusts, or content that does not match) or \"Error\".\n\n"
+               "Options:\n"
+               "  --data FILE  the signed content, for a detached signature (default: the\n"
+               "               content inside SIGNATURE)\n"
+               "  --cert FILE  trust this certificate file as the maker's instead of the\n"
+               "               installed one\n"
+               "  --json       print one JSON object\n"
+               "  -h, --help   show this help\n\n"
+               "Exit status: 0 maker or partner signed, 1 not trusted, 2 error, 64 usage error.\n");
 }
 
 int Verify(const std::vector<std::string> &args) {

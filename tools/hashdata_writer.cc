@@ -1,20 +1,19 @@
 #include "hashdata_writer.h"
 
+#include <fcntl.h>
 #include <openssl/err.h>
 #include <openssl/evp.h>
 #include <openssl/pem.h>
 #include <openssl/pkcs7.h>
 #include <openssl/x509.h>
+#include <sys/stat.h>
+#include <unistd.h>
 
 #include <cerrno>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <vector>
-
-#include <fcntl.h>
-#include <sys/stat.h>
-#include <unistd.h>
 
 #include "progress.h"
 
@@ -136,7 +135,8 @@ std::unique_ptr<Signer> Signer::Load(const std::string &keyFile, const std::stri
   std::unique_ptr<Signer> s(new Signer());
   s->state_ = std::make_unique<State>();
   BioPtr kb(BIO_new_file(keyFile.c_str(), "r"));
-  if (kb != nullptr) s->state_->key.reset(PEM_read_bio_PrivateKey(kb.get(), nullptr, nullptr, nullptr));
+  if (kb != nullptr)
+    s->state_->key.reset(PEM_read_bio_PrivateKey(kb.get(), nullptr, nullptr, nullptr));
   if (s->state_->key == nullptr) {
     *error = OpensslError("cannot read the key " + keyFile);
     return nullptr;

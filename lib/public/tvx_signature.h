@@ -36,12 +36,13 @@
  *     "Unable to load PKCS7 certificate."). An error slot is never set to a
  *     copy of NULL.
  *  3. A validity check that fails without an error of its own (the signature
- *     is sound but not trusted, or trusted only as a partner's where the
- *     maker's is required) sets the text to OpenSSL's reason for refusing the
- *     maker's chain, with its detail in parentheses when OpenSSL gives one
- *     ("certificate verify error (Verify error:certificate revoked)"), or to
- *     the status text when OpenSSL recorded nothing. So a FALSE result always
- *     comes with a text.
+ *     is not trusted, or trusted only as a partner's where the maker's is
+ *     required, or the content does not match) sets the text to why the
+ *     maker's store refused it: OpenSSL's reason with the first chain error
+ *     that was not let pass, "certificate verify error (certificate
+ *     revoked)", or OpenSSL's reason and detail for any other refusal
+ *     ("signature failure (...)"), or the status text when OpenSSL recorded
+ *     nothing. So a FALSE result always comes with a text.
  *  4. A validity check whose slot already holds a text on entry returns FALSE
  *     at once and leaves the text alone (it is neither freed nor replaced).
  *  5. Buffers of 2 GiB or more are refused (OpenSSL's memory BIOs take an int

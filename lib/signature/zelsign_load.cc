@@ -77,7 +77,8 @@ TVX_EXPORT void ZelSign_GetDigestFromPKCS7(PKCS7 *p7, char **content, size_t *le
   try {
     tvx::UniquePtr<BIO> out(BIO_new(BIO_s_mem()));
     if (out == nullptr || p7 == nullptr ||
-        PKCS7_verify(p7, nullptr, nullptr, nullptr, out.get(), PKCS7_BINARY | PKCS7_NOVERIFY) <= 0) {
+        PKCS7_verify(p7, nullptr, nullptr, nullptr, out.get(), PKCS7_BINARY | PKCS7_NOVERIFY) <=
+            0) {
       sig::SetError(err, sig::ReasonText(ERR_get_error()));
       return;
     }
@@ -96,12 +97,18 @@ TVX_EXPORT void ZelSign_GetDigestFromPKCS7(PKCS7 *p7, char **content, size_t *le
 
 TVX_EXPORT const char *ZelSign_StatusToString(uint32_t status) {
   switch (status) {
-    case ZELSIGN_TRX_SIGNED: return "Tarvex Signed";
-    case ZELSIGN_PARTNER_SIGNED: return "Partner Signed";
-    case ZELSIGN_UNSIGNED: return "Unsigned";
-    case ZELSIGN_INVALID_DIGEST: return "Invalid Digest";
-    case ZELSIGN_INVALID_CERT: return "Invalid Certificate";
-    default: return "Error";
+    case ZELSIGN_TRX_SIGNED:
+      return "Tarvex Signed";
+    case ZELSIGN_PARTNER_SIGNED:
+      return "Partner Signed";
+    case ZELSIGN_UNSIGNED:
+      return "Unsigned";
+    case ZELSIGN_INVALID_DIGEST:
+      return "Invalid Digest";
+    case ZELSIGN_INVALID_CERT:
+      return "Invalid Certificate";
+    default:
+      return "Error";
   }
 }
 

@@ -53,8 +53,8 @@ bool LoadCrl(X509_STORE *store, const char *path, char **err) {
     return false;
   }
   ERR_clear_error();
-  X509_STORE_set_flags(store,
-                       X509_V_FLAG_CRL_CHECK | X509_V_FLAG_CRL_CHECK_ALL | X509_V_FLAG_POLICY_CHECK);
+  X509_STORE_set_flags(
+      store, X509_V_FLAG_CRL_CHECK | X509_V_FLAG_CRL_CHECK_ALL | X509_V_FLAG_POLICY_CHECK);
   if (err != nullptr) *err = nullptr;
   return true;
 }

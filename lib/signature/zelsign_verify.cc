@@ -17,8 +17,7 @@ struct X509RefsDeleter {
 };
 using X509Refs = std::unique_ptr<STACK_OF(X509), X509RefsDeleter>;
 
-bool Attempt(PKCS7 *p7, STACK_OF(X509) * certs, X509_STORE *store, BIO *data, BIO *out,
-             int flags) {
+bool Attempt(PKCS7 *p7, STACK_OF(X509) * certs, X509_STORE *store, BIO *data, BIO *out, int flags) {
   // Every attempt reads the detached content from its start.
   if (data != nullptr) (void)BIO_reset(data);
   return PKCS7_verify(p7, certs, store, data, out, flags) > 0;
@@ -122,10 +121,10 @@ uint32_t Verify(PKCS7 *p7, BIO *data, X509_STORE *store, const TrustFiles &files
     }
     if (Attempt(p7, certs.get(), maker, data, out.get(), PKCS7_BINARY)) return ZELSIGN_TRX_SIGNED;
     if (makerRefusal != nullptr && makerRefusal->empty()) {
-      *makerRefusal = note.code == X509_V_OK ? LastErrorText()
-                                             : std::string(ReasonText(ERR_peek_last_error())) +
-                                                   " (" + X509_verify_cert_error_string(note.code) +
-                                                   ")";
+      *makerRefusal = note.code == X509_V_OK
+                          ? LastErrorText()
+                          : std::string(ReasonText(ERR_peek_last_error())) + " (" +
+                                X509_verify_cert_error_string(note.code) + ")";
     }
     if (Attempt(p7, certs.get(), partner.get(), data, out.get(), PKCS7_BINARY)) {
       return ZELSIGN_PARTNER_SIGNED;

@@ -105,7 +105,8 @@ bool Valid(const uint8_t *buf, uint64_t size) {
   } else if (h.hashCount != (size - h.metadataLength) / h.hashSize) {  // metadataLength <= size
     return Fail("ToolsISO: Error hashCount mismatch.\n");
   }
-  if (h.firstHashOffset < h.metadataLength) return Fail("ToolsISO: Error firstHashOffset too small.\n");
+  if (h.firstHashOffset < h.metadataLength)
+    return Fail("ToolsISO: Error firstHashOffset too small.\n");
   if (h.signatureOffset != 0) {
     if (h.signatureSize == 0 || h.signatureSize >= size) {
       return Fail("ToolsISO: Error signature size invalid.\n");

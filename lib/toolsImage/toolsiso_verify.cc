@@ -82,9 +82,9 @@ bool VerifySignature(const char *certName, const void *sig, size_t sigLen, const
                      size_t dataLen) {
   char *err = nullptr;
   // The loader takes a 32-bit length; a longer signature is refused whole.
-  UniquePtr<PKCS7> p7(sigLen <= UINT32_MAX ? ZelSign_GetPKCS7FromRawBuffer(
-                                                 sig, static_cast<uint32_t>(sigLen), &err)
-                                           : nullptr);
+  UniquePtr<PKCS7> p7(sigLen <= UINT32_MAX
+                          ? ZelSign_GetPKCS7FromRawBuffer(sig, static_cast<uint32_t>(sigLen), &err)
+                          : nullptr);
   if (p7 == nullptr) {
     Log("ToolsISO: Error failed to load signature buffer: %s\n",
         err != nullptr ? err : signature::kNoReason);
@@ -110,9 +110,8 @@ namespace iso = tvx::toolsiso;
 
 extern "C" {
 
-TVX_EXPORT Bool ToolsISO_VerifyHashes(ToolsIsoHashInfo *info, uint64_t offset,
-                                      const uint8_t *bytes, size_t length,
-                                      Bool continueOnMismatch) {
+TVX_EXPORT Bool ToolsISO_VerifyHashes(ToolsIsoHashInfo *info, uint64_t offset, const uint8_t *bytes,
+                                      size_t length, Bool continueOnMismatch) {
   try {
     return info != nullptr && iso::VerifyHashes(*info, offset, bytes, length, continueOnMismatch);
   } catch (...) {

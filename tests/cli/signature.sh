@@ -25,11 +25,8 @@ json() {  # json JSON EXPRESSION -> the value of j[...] as JSON text
   /usr/bin/python3 -c 'import json,sys; j=json.loads(sys.argv[1]); print(json.dumps(eval(sys.argv[2])))' "$1" "$2"
 }
 
-"$tool" hashdata create --help >/dev/null; check "hashdata create --help" 0 $?
-"$tool" hashdata check a >/dev/null 2>&1; check "hashdata check with one file" 64 $?
 "$tool" hashdata create --block-size 4097 --key k --cert c i o >/dev/null 2>&1
 check "hashdata create with a block size above 4096" 64 $?
-"$tool" signature verify >/dev/null 2>&1; check "signature verify without a file" 64 $?
 
 if [ -z "$certs" ]; then
   echo "skip: the build trusts a certificate directory outside its tree"
@@ -52,9 +49,6 @@ done
 sign partner "$work/map.txt" "$work/partner.p7" --embed
 out=$("$tool" signature verify --json "$work/partner.p7"); st=$?
 check "signature verify --json, content inside" 0 $st "$(json "$out" 'j["statusText"]')" '"Partner Signed"'
-echo "changed" >>"$work/map.txt"
-out=$("$tool" signature verify --data "$work/map.txt" "$work/maker.sig" 2>/dev/null)
-check "signature verify: changed content" 1 $? "$out" "Invalid Certificate"
 echo "not a signature" >"$work/junk.sig"
 out=$("$tool" signature verify --json "$work/junk.sig"); st=$?
 check "signature verify: not PEM" 2 $st "$(json "$out" 'j["error"]')" '"no start line"'
@@ -83,7 +77,12 @@ check "hashdata check: detached" 0 $st "$(json "$out" '[j["ok"], j["signature"]]
 cat "$pki/partner.pem" >"$work/partner.bundle"
 create partner "$work/partner.bundle" --embed-signature "$work/tools.iso" "$work/p.sha" >/dev/null
 out=$("$tool" hashdata check --json "$work/p.sha" "$work/tools.iso"); st=$?
-check "hashdata check: a partner may not sign tools" 1 $st "$(json "$out" 'j["signatureValid"]')" false
+check "hashdata check: a partner may not sign tools" 1 $st "$(json "$out" 'j["signatureError"]')" \
+  '"ToolsISO: Error failed to verify signature using default cert: certificate verify error (unable to get local issuer certificate)"'
+cp "$work/junk.sig" "$work/det.sig"
+out=$("$tool" hashdata check --json "$work/det.sha" "$work/tools.iso"); st=$?
+check "hashdata check: a detached signature that is no PEM" 1 $st "$(json "$out" 'j["signatureError"]')" \
+  '"ToolsISO: Error failed to load signature buffer: no start line"'
 out=$("$tool" hashdata check --json --cert "$certs/tvxpartner.cert" "$work/p.sha" "$work/tools.iso"); st=$?
 check "hashdata check: --cert names the trusted file" 0 $st "$(json "$out" 'j["ok"]')" true
 

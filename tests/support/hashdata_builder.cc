@@ -2,17 +2,12 @@
 
 #include <openssl/evp.h>
 
-#include <cstring>
 #include <stdexcept>
 
 namespace tvxtest {
 
-void PutLe32(std::string *buf, size_t offset, uint32_t value) {
-  for (int i = 0; i < 4; i++) (*buf)[offset + i] = static_cast<char>(value >> (8 * i));
-}
-
-void PutLe64(std::string *buf, size_t offset, uint64_t value) {
-  for (int i = 0; i < 8; i++) (*buf)[offset + i] = static_cast<char>(value >> (8 * i));
+void PutLe(std::string *buf, size_t offset, uint64_t value, int bytes) {
+  for (int i = 0; i < bytes; i++) (*buf)[offset + i] = static_cast<char>(value >> (8 * i));
 }
 
 std::string BlockHashes(const std::string &image, uint32_t blockSize) {
@@ -29,38 +24,24 @@ std::string BlockHashes(const std::string &image, uint32_t blockSize) {
   return out;
 }
 
-std::string BuildHashData(const std::string &image, const HashDataLayout &layout) {
-  std::string hashes = BlockHashes(image, layout.blockSize);
-  std::string buf(layout.metadataLength, '\0');
-  std::memcpy(buf.data(), "A Tarvex External Hashdata File", 32);
-  uint32_t hashFileBlockSize = layout.hashFileBlockSize;
-  if (layout.signatureRoom != 0 && hashFileBlockSize == 0) hashFileBlockSize = layout.blockSize;
-  PutLe32(&buf, kHdMetadataLength, layout.metadataLength);
-  PutLe32(&buf, kHdBlockSize, layout.blockSize);
-  PutLe32(&buf, kHdHashSize, 32);
-  PutLe32(&buf, kHdHashFileBlockSize, hashFileBlockSize);
-  PutLe64(&buf, kHdFirstHashOffset, layout.metadataLength);
-  PutLe64(&buf, kHdHashCount, hashes.size() / 32);
-  uint64_t total = layout.metadataLength + hashes.size() + layout.signatureRoom;
-  PutLe64(&buf, kHdSignatureOffset, layout.signatureRoom != 0 ? total - layout.signatureRoom : 0);
-  PutLe64(&buf, kHdSignatureSize, layout.signatureRoom);
-  std::memcpy(buf.data() + kHdAlgorithm, "SHA-256", 8);
-  buf += hashes;
-  buf.append(layout.signatureRoom, '\0');
+std::string BuildHashData(const std::string &image, const HashDataLayout &layout,
+                          size_t *signedSize) {
+  std::string buf(512, '\0');
+  buf.replace(0, 32, "A Tarvex External Hashdata File", 32);  // with its NUL
+  buf += BlockHashes(image, layout.blockSize);
+  uint64_t room = layout.signatureRoom;
+  PutLe(&buf, kHdMetadataLength, 512, 4);
+  PutLe(&buf, kHdBlockSize, layout.blockSize, 4);
+  PutLe(&buf, kHdHashSize, 32, 4);
+  PutLe(&buf, kHdHashFileBlockSize, room != 0 ? layout.blockSize : 0, 4);
+  PutLe(&buf, kHdFirstHashOffset, 512, 8);
+  PutLe(&buf, kHdHashCount, (buf.size() - 512) / 32, 8);
+  PutLe(&buf, kHdSignatureOffset, room != 0 ? buf.size() : 0, 8);
+  PutLe(&buf, kHdSignatureSize, room, 8);
+  buf.replace(kHdAlgorithm, 8, "SHA-256", 8);
+  if (signedSize != nullptr) *signedSize = buf.size();
+  buf.append(room, '\0');
   return buf;
-}
-
-std::string SignedPart(const std::string &hashData, const HashDataLayout &layout) {
-  return hashData.substr(0, hashData.size() - layout.signatureRoom);
-}
-
-bool EmbedSignature(std::string *hashData, const HashDataLayout &layout,
-                    const std::string &signature) {
-  if (signature.size() > layout.signatureRoom) return false;
-  std::string tail = signature;
-  tail.resize(layout.signatureRoom, '\n');
-  hashData->replace(hashData->size() - layout.signatureRoom, layout.signatureRoom, tail);
-  return true;
 }
 
 }  // namespace tvxtest

@@ -1,6 +1,5 @@
 // The test PKI (scripts/make-test-pki) from C++ tests: the build's own
-// certificate directory with the PKI in it, and signatures made by the
-// openssl CLI with its signers.
+// certificate directory with the PKI in it, and signatures by its signers.
 #pragma once
 
 #include <string>
@@ -14,11 +13,8 @@ namespace tvxtest {
 // they never write to a system directory.
 std::string TestCertDir();
 
-// MakePki makes the test PKI in `dir` (any directory); false on failure.
-bool MakePki(const std::string &dir);
-
 // Signers of the test PKI.
-inline constexpr const char *kPkiSigners[] = {"maker",   "partner", "stranger", "expired",
+inline constexpr const char *kPkiSigners[] = {"maker",   "partner", "stranger",    "expired",
                                               "revoked", "deep",    "deepstranger"};
 
 // Sign returns a PEM PKCS#7 signature of `data` by `signer` of the PKI in
