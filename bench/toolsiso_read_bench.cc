@@ -42,7 +42,7 @@ struct Fixture {
     image = dir + "/linux.iso";
     std::string pki = dir + "/pki";
     cert = pki + "/tarvex.cert";
-    if (!tvxtest::MakePki(pki)) return;
+    if (tvxtest::RunArgv({tvxtest::SourceDir() + "/scripts/make-test-pki", pki}) != 0) return;
     if (std::filesystem::exists(image + ".sig")) {
       ok = true;
       return;
