@@ -37,7 +37,8 @@ fi
 "$src/scripts/make-test-pki" "$certs" || { echo "FAIL: make-test-pki"; exit 1; }
 cat "$certs/signers/maker.pem" "$certs/signers/maker.chain" >"$work/maker.bundle"
 
-# Two images: Windows with a detached signature, Linux with an embedded one.
+# Two images: Windows with a detached signature and 2048-byte blocks, Linux
+# with an embedded one and 4096-byte blocks.
 iso=$work/tools/isoimages
 mkdir -p "$iso" "$work/tree/win" "$work/tree/lin/bin"
 printf 'family = "windows"\n' >"$work/tree/win/manifest.txt"
@@ -45,12 +46,14 @@ printf 'family = "linux"\n' >"$work/tree/lin/manifest.txt"
 head -c 200000 /dev/urandom >"$work/tree/lin/bin/payload"
 xorriso -as mkisofs -quiet -R -J -o "$iso/windows.iso" "$work/tree/win" 2>/dev/null
 xorriso -as mkisofs -quiet -R -J -o "$iso/linux.iso" "$work/tree/lin" 2>/dev/null
-hashdata() {
-  "$tool" hashdata create --quiet --block-size 2048 --key "$certs/signers/maker.key" \
+hashdata() {  # hashdata BLOCKSIZE [OPTIONS] IMAGE OUT
+  local bs=$1
+  shift
+  "$tool" hashdata create --quiet --block-size "$bs" --key "$certs/signers/maker.key" \
     --cert "$work/maker.bundle" "$@" >/dev/null
 }
-hashdata "$iso/windows.iso" "$iso/windows.iso.sha"
-hashdata --embed-signature "$iso/linux.iso" "$iso/linux.iso.sha"
+hashdata 2048 "$iso/windows.iso" "$iso/windows.iso.sha"
+hashdata 4096 --embed-signature "$iso/linux.iso" "$iso/linux.iso.sha"
 map=$iso/isoimages_manifest.txt
 printf 'windows9-64 = "windows.iso"\nrhel6 = "linux.iso"\n' >"$map"
 "$src/scripts/make-test-pki" sign "$certs" maker "$map" "$map.sig"
@@ -81,7 +84,7 @@ offset=$(/usr/bin/python3 -c 'import sys; d=open(sys.argv[1],"rb").read(); print
   "$iso/linux.iso" "$work/tree/lin/bin/payload")
 printf 'X' | dd of="$iso/linux.iso" bs=1 seek="$offset" conv=notrunc status=none
 out=$("$tool" tools verify --json "$iso/linux.iso")
-check "flipped byte found" 1 $? "$out" "\"firstBadBlock\": $((offset / 2048))"
+check "flipped byte found" 1 $? "$out" "\"firstBadBlock\": $((offset / 4096))"
 out=$("$tool" tools cat "$iso/linux.iso" bin/payload 2>&1 >/dev/null)
 check "cat through a bad block fails" 1 $? "$out" "Invalid data at offset"
 
