@@ -1,17 +1,18 @@
 // Fuzzes the PKCS#7 loaders and what runs on a loaded object: the PEM reader
-// (from a buffer), taking the signed content out, and the signer check with
-// its store building, which walks signer infos and certificates of the
-// object. No certificate directory is needed: without one every signer is
-// untrusted. Properties: a loaded object's content copy is NUL-terminated,
-// a failure always comes with an error text, and the check's status is one
-// it can produce.
+// (from a buffer; DER inputs are wrapped in PEM first), taking the signed content out, and the
+// signer check with its store building, which walks signer infos and certificates of the object. No
+// certificate directory is needed: without one every signer is untrusted. Properties: a loaded
+// object's content copy is NUL-terminated, a failure always comes with an error text, and the
+// check's status is one it can produce.
 #include <openssl/err.h>
+#include <openssl/evp.h>
 #include <openssl/pkcs7.h>
 
 #include <cstdint>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <string>
 
 #include "tvx_signature.h"
 
@@ -26,12 +27,27 @@ void Require(bool ok, const char *what) {
   }
 }
 
+// AsPem wraps DER bytes in a PEM block, so that mutations reach the PKCS#7
+// structure rather than only the base64 layer.
+std::string AsPem(const uint8_t *der, size_t size) {
+  std::string b64(4 * ((size + 2) / 3) + 1, '\0');
+  int n =
+      EVP_EncodeBlock(reinterpret_cast<unsigned char *>(b64.data()), der, static_cast<int>(size));
+  std::string pem = "-----BEGIN PKCS7-----\n";
+  for (int at = 0; at < n; at += 64) pem += b64.substr(static_cast<size_t>(at), 64) + "\n";
+  return pem + "-----END PKCS7-----\n";
+}
+
 }  // namespace
 
+// Input: byte 0 odd, then DER (wrapped in PEM here); else PEM text as it is.
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
   if (size > kMaxInput) return 0;
+  std::string pem = size > 0 && (data[0] & 1) != 0
+                        ? AsPem(data + 1, size - 1)
+                        : std::string(reinterpret_cast<const char *>(data), size);
   char *err = nullptr;
-  PKCS7 *p7 = ZelSign_GetPKCS7FromRawBuffer(data, static_cast<uint32_t>(size), &err);
+  PKCS7 *p7 = ZelSign_GetPKCS7FromRawBuffer(pem.data(), static_cast<uint32_t>(pem.size()), &err);
   Require((p7 == nullptr) == (err != nullptr), "load result and error text disagree");
   std::free(err);
   err = nullptr;
@@ -52,7 +68,7 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
     std::free(err);
     err = nullptr;
     // Detached content, as the tools-image checks pass it.
-    Bool valid = ZelSign_IsTrxSignatureValid(p7, data, size, nullptr, nullptr, &err);
+    Bool valid = ZelSign_IsTrxSignatureValid(p7, pem.data(), pem.size(), nullptr, nullptr, &err);
     Require(valid != (err != nullptr), "validity and error text disagree");
     std::free(err);
     PKCS7_free(p7);

@@ -18,8 +18,20 @@ struct X509RefsDeleter {
 using X509Refs = std::unique_ptr<STACK_OF(X509), X509RefsDeleter>;
 
 bool Attempt(PKCS7 *p7, STACK_OF(X509) * certs, X509_STORE *store, BIO *data, BIO *out, int flags) {
-  // Every attempt reads the detached content from its start.
-  if (data != nullptr) (void)BIO_reset(data);
+  if (data != nullptr) {
+    // Every attempt reads the detached content from its start.
+    (void)BIO_reset(data);
+    // PKCS7_verify reads a memory BIO through a temporary copy, which OpenSSL
+    // 3.0 leaks when it cannot set up the signature's digests. Set them up
+    // here first, and stop where that would fail.
+    BIO *chain = PKCS7_dataInit(p7, data);
+    if (chain == nullptr) return false;
+    while (chain != nullptr && chain != data) {
+      BIO *next = BIO_pop(chain);
+      BIO_free(chain);
+      chain = next;
+    }
+  }
   return PKCS7_verify(p7, certs, store, data, out, flags) > 0;
 }
 

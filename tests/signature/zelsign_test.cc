@@ -50,6 +50,9 @@ class ZelSignTest : public testing::Test {
       sigs_[s] = tvxtest::Sign(certDir_, s, kData, false);
       sigs_[std::string(s) + "+"] = tvxtest::Sign(certDir_, s, kData, true);
     }
+    // Two digest algorithms put two digest BIOs in front of the content
+    // (where a leak once hid).
+    sigs_["two digests"] = tvxtest::Sign(certDir_, "maker+partner", kData, false);
   }
   static void TearDownTestSuite() { delete tmp_; }
   void SetUp() override {
@@ -92,6 +95,8 @@ TEST_F(ZelSignTest, StatusMatrix) {
       {"chain of depth 5", "deep", kOwn, kDefault, false, ZELSIGN_TRX_SIGNED, nullptr},
       {"untrusted chain of depth 5", "deepstranger", kOwn, kDefault, false, ZELSIGN_INVALID_CERT,
        "certificate verify error (self-signed certificate in certificate chain)"},
+      {"two signers, one untrusted", "two digests", kOwn, kDefault, false, ZELSIGN_INVALID_CERT,
+       "certificate verify error (unable to get local issuer certificate)"},
       {"tampered data", "maker", kOwn, kDefault, true, ZELSIGN_INVALID_CERT, "signature failure*"},
       {"maker CRL missing", "maker", kNoMakerCrl, kDefault, false, ZELSIGN_TRX_SIGNED, nullptr},
       {"maker CRL missing: revocation unchecked", "revoked", kNoMakerCrl, kDefault, false,
