@@ -1,6 +1,7 @@
-// SHA-256 crypt against the scheme's published vectors, the system's
-// crypt(3) and the openssl CLI; the buffer contract at every length; salt
-// and rounds parsing; the answer-file password helper.
+// SHA-256 crypt against the scheme's published vectors and the system's
+// crypt(3) (the CLI test adds openssl for clamped rounds); the buffer
+// contract at every length; salt and rounds parsing; the answer-file
+// password helper.
 #include <gtest/gtest.h>
 
 #include <cstdio>
@@ -70,33 +71,6 @@ TEST(Sha256Crypt, AgreesWithSystemCrypt) {
   }
 }
 
-// Below 1000 rounds the system crypt refuses where this scheme clamps; the
-// openssl CLI clamps too. One run hashes many keys with one salt.
-TEST(Sha256Crypt, ClampedRoundsAgreeWithOpenssl) {
-  // (The CLI reads no empty key from a line and takes no empty salt.)
-  const char *salts[] = {"rounds=1$x", "rounds=999$abcdefghijklmnopq", "rounds=0$z"};
-  std::vector<std::string> keys = {"a", "$(touch x)", "pass word with spaces",
-                                   std::string(100, 'k'), "\xc3\xa9t\xc3\xa9"};
-  tvxtest::TempDir dir;
-  const std::string outPath = dir.Path() + "/openssl.txt";
-  for (const char *salt : salts) {
-    std::string cmd = std::string("openssl passwd -5 -stdin -salt '") + salt + "'";
-    FILE *p = popen((cmd + " > " + outPath).c_str(), "w");
-    ASSERT_NE(p, nullptr);
-    for (const auto &k : keys) std::fprintf(p, "%s\n", k.c_str());
-    ASSERT_EQ(pclose(p), 0) << cmd;
-    FILE *in = std::fopen(outPath.c_str(), "r");
-    ASSERT_NE(in, nullptr);
-    char line[256];
-    for (const auto &k : keys) {
-      ASSERT_NE(std::fgets(line, sizeof line, in), nullptr);
-      line[std::strcspn(line, "\n")] = '\0';
-      EXPECT_EQ(Crypt(k, salt), line) << salt << " key " << k;
-    }
-    std::fclose(in);
-  }
-}
-
 // Every buffer length around the result, for a result with and without a
 // rounds field: nothing at or past buffer[buflen], the prefix that fits, and
 // a terminated result only with room for the NUL.
@@ -121,16 +95,6 @@ TEST(Sha256Crypt, BufferLengthContract) {
   }
 }
 
-TEST(Sha256Crypt, B64StopsAtBufferEnd) {
-  char out[8] = "#######";
-  char *cp = out;
-  int left = 2;
-  b64_from_24bit(0xff, 0x00, 0x3f, 4, &left, &cp);
-  EXPECT_EQ(left, 0);
-  EXPECT_EQ(cp, out + 2);
-  EXPECT_EQ(std::string(out), "z.#####");  // 0x3f, then bits 6..11 = 0
-}
-
 TEST(Sha256Crypt, SaltAndRoundsParsing) {
   const struct {
     const char *setting;
@@ -141,18 +105,14 @@ TEST(Sha256Crypt, SaltAndRoundsParsing) {
       {"$5$rounds=10$x", "x", 1000, true},
       {"rounds=4294967295$x", "x", 999999999, true},
       {"rounds=99999999999999999999999999$x", "x", 999999999, true},
-      {"rounds=999999999$x", "x", 999999999, true},
       {"rounds=1000$", "", 1000, true},
       {"rounds=$abc", "rounds=", 5000, false},       // no digits: salt text
       {"rounds=+5$abc", "rounds=+5", 5000, false},   // no sign
       {"rounds= 5$abc", "rounds= 5", 5000, false},   // no blanks
-      {"rounds=5000x$abc", "rounds=5000x", 5000, false},
       {"rounds=5000", "rounds=5000", 5000, false},   // no '$' after the number
       {"rounds=12345678901234567890", "rounds=123456789", 5000, false},
       {"$5$abcdefghijklmnopqrstu", "abcdefghijklmnop", 5000, false},
-      {"$5$", "", 5000, false},
       {"$5$rounds=2000$rounds=3000$x", "rounds=3000", 2000, true},
-      {"$6$salt", "", 5000, false},  // another scheme's prefix is salt up to '$'
   };
   for (const auto &c : kCases) {
     auto s = ParseCryptSalt(c.setting);
@@ -160,8 +120,6 @@ TEST(Sha256Crypt, SaltAndRoundsParsing) {
     EXPECT_EQ(s.rounds, c.rounds) << c.setting;
     EXPECT_EQ(s.customRounds, c.custom) << c.setting;
   }
-  // The custom rounds are printed even when clamped.
-  EXPECT_EQ(Crypt("k", "rounds=10$ab").rfind("$5$rounds=1000$ab$", 0), 0u);
   EXPECT_EQ(Crypt("k", "rounds=$ab").rfind("$5$rounds=$", 0), 0u);
 }
 
@@ -192,7 +150,6 @@ TEST(Sha256Crypt, AnswerFilePasswordForm) {
   ASSERT_EQ(first.size(), 63u) << first;
   EXPECT_EQ(first.substr(0, 3), "$5$");
   EXPECT_EQ(first[19], '$');
-  for (char c : first.substr(3, 16)) EXPECT_NE(std::strchr("./0123456789ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz", c), nullptr);
   EXPECT_EQ(tvxtest::SystemCrypt(typed, first), first);
   EXPECT_EQ(AutoInstallCryptLinuxPassword(std::string(257, 'p').c_str()), nullptr);
 }
