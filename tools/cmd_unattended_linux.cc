@@ -77,10 +77,14 @@ int Parse(const std::vector<std::string> &args, Options *o) {
   };
   std::string passwordFile, rootFile;
   Valued valued[] = {
-      {"--user", &o->user},          {"--full-name", &o->fullName},
-      {"--password", &o->password},  {"--password-file", &passwordFile},
-      {"--root-password", &o->rootPassword}, {"--root-password-file", &rootFile},
-      {"--install-key", &o->key},    {"--out", &o->out},
+      {"--user", &o->user},
+      {"--full-name", &o->fullName},
+      {"--password", &o->password},
+      {"--password-file", &passwordFile},
+      {"--root-password", &o->rootPassword},
+      {"--root-password-file", &rootFile},
+      {"--install-key", &o->key},
+      {"--out", &o->out},
   };
   enum { kUser, kFullName, kPassword, kPasswordFile, kRoot, kRootFile, kKey, kOut };
   const std::pair<const char *, bool *> flags[] = {
@@ -219,8 +223,7 @@ int Run(const std::vector<std::string> &args) {
                               .Text()
                               .c_str());
     } else if (guessRc != 2) {
-      std::fprintf(stderr, "tvxguest %s: no guest OS recognised on %s\n", kName,
-                   o.image.c_str());
+      std::fprintf(stderr, "tvxguest %s: no guest OS recognised on %s\n", kName, o.image.c_str());
     }
     return guessRc == 2 ? 2 : 1;
   }
@@ -235,7 +238,9 @@ int Run(const std::vector<std::string> &args) {
   std::vector<std::string> log, files;
   Staging stage(o.out);
   bool ok = !stage.Path().empty();
-  if (!ok) log.push_back("cannot make a staging directory beside " + o.out + ": " + std::strerror(errno));
+  if (!ok) {
+    log.push_back("cannot make a staging directory beside " + o.out + ": " + std::strerror(errno));
+  }
   if (ok) {
     if (!Verbose()) Tvx_SetLogSink(Capture, &log);
     ok = AutoInstall_PrepareAnswerFileEx_Linux(

@@ -28,8 +28,7 @@ constexpr size_t kDigest = 32;
 constexpr size_t kResultMax = 3 + 7 + 9 + 1 + kSaltMax + 1 + 43;
 
 constexpr char kB64[] = "./0123456789ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz";
-constexpr char kSaltAlphabet[] =
-    "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789./";
+constexpr char kSaltAlphabet[] = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789./";
 
 }  // namespace
 

@@ -56,16 +56,15 @@ TEST(Sha256Crypt, PublishedVectors) {
 TEST(Sha256Crypt, AgreesWithSystemCrypt) {
   ASSERT_NE(tvxtest::SystemCrypt("x", "$5$ab"), "") << "libcrypt.so.1 not usable";
   std::mt19937 rng(20261123);
-  const std::string alphabet =
-      "./0123456789ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz";
+  const std::string alphabet = "./0123456789ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz";
   for (int i = 0; i < 300; ++i) {
     std::string key(rng() % 257, '\0');
     for (char &c : key) c = static_cast<char>(1 + rng() % 255);
     std::string salt(rng() % 21, '\0');
     for (char &c : salt) c = alphabet[rng() % alphabet.size()];
     // Few rounds keep the loop short; every tenth case uses the default.
-    std::string setting = i % 10 == 0 ? "$5$" + salt
-                                     : "$5$rounds=" + std::to_string(1000 + rng() % 100) + "$" + salt;
+    std::string setting =
+        i % 10 == 0 ? "$5$" + salt : "$5$rounds=" + std::to_string(1000 + rng() % 100) + "$" + salt;
     ASSERT_EQ(Crypt(key, setting), tvxtest::SystemCrypt(key, setting))
         << "case " << i << " key length " << key.size() << " setting " << setting;
   }
@@ -106,10 +105,10 @@ TEST(Sha256Crypt, SaltAndRoundsParsing) {
       {"rounds=4294967295$x", "x", 999999999, true},
       {"rounds=99999999999999999999999999$x", "x", 999999999, true},
       {"rounds=1000$", "", 1000, true},
-      {"rounds=$abc", "rounds=", 5000, false},       // no digits: salt text
-      {"rounds=+5$abc", "rounds=+5", 5000, false},   // no sign
-      {"rounds= 5$abc", "rounds= 5", 5000, false},   // no blanks
-      {"rounds=5000", "rounds=5000", 5000, false},   // no '$' after the number
+      {"rounds=$abc", "rounds=", 5000, false},      // no digits: salt text
+      {"rounds=+5$abc", "rounds=+5", 5000, false},  // no sign
+      {"rounds= 5$abc", "rounds= 5", 5000, false},  // no blanks
+      {"rounds=5000", "rounds=5000", 5000, false},  // no '$' after the number
       {"rounds=12345678901234567890", "rounds=123456789", 5000, false},
       {"$5$abcdefghijklmnopqrstu", "abcdefghijklmnop", 5000, false},
       {"$5$rounds=2000$rounds=3000$x", "rounds=3000", 2000, true},

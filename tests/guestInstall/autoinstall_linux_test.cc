@@ -141,8 +141,8 @@ TEST_F(LinuxAnswers, HostileTextsStayIntactAndInert) {
   for (const std::string &name : names) {
     SCOPED_TRACE(name);
     // Red Hat: %post passes sh -n; the chfn line, run by sh, gives the name.
-    Prepared ks = Prepare("rhel7-64", GUESS_VERSION_RHEL_WORKSTATION, name, nullptr, FALSE,
-                          FALSE, "jo", kHostilePassword, kRootPassword);
+    Prepared ks = Prepare("rhel7-64", GUESS_VERSION_RHEL_WORKSTATION, name, nullptr, FALSE, FALSE,
+                          "jo", kHostilePassword, kRootPassword);
     ASSERT_TRUE(ks.ok);
     std::string post = ks.text.substr(ks.text.find("%post\n") + 6);
     post = post.substr(0, post.rfind("%end"));
@@ -189,10 +189,10 @@ TEST_F(LinuxAnswers, HostileTextsStayIntactAndInert) {
     ASSERT_TRUE(mi.ok);
     EXPECT_EQ(RunIn({"perl", "-c", mi.path}, dir_.Path()).status, 0);
     Ran perl = RunIn({"perl", "-e",
-                    "our $o; do $ARGV[0] or die; print join(\"\\0\", $o->{users}[0]{realname}, "
-                    "$o->{users}[0]{password}, $o->{superuser}{password}, $o->{security_user})",
-                    mi.path},
-                   dir_.Path());
+                      "our $o; do $ARGV[0] or die; print join(\"\\0\", $o->{users}[0]{realname}, "
+                      "$o->{users}[0]{password}, $o->{superuser}{password}, $o->{security_user})",
+                      mi.path},
+                     dir_.Path());
     EXPECT_EQ(perl.out, name + '\0' + kHostilePassword + '\0' + kRootPassword + '\0' + "jo");
     EXPECT_FALSE(fs::exists(dir_.Path() + "/x")) << "a typed text ran as code";
   }
@@ -204,9 +204,9 @@ TEST_F(LinuxAnswers, KickstartChoices) {
     const char *guestOS;
     GuessVersion version;
     const char *key;
-    int tmpl;            // 1, 2, 3
-    bool old;            // langsupport, mouse, --resolvedeps, empty zerombr switch
-    bool modern;         // %end active, zerombr and xconfig commented
+    int tmpl;     // 1, 2, 3
+    bool old;     // langsupport, mouse, --resolvedeps, empty zerombr switch
+    bool modern;  // %end active, zerombr and xconfig commented
     bool biosboot;
     bool python;
     const char *keyLine;
@@ -219,8 +219,8 @@ TEST_F(LinuxAnswers, KickstartChoices) {
        "@ Chinese-support", "@ x11", "ks=cdrom:/ks.cfg"},
       {"rhel6-64", GUESS_VERSION_RHEL_SERVER, "abc-123", 1, false, true, false, true,
        "#key abc-123", "@ Desktop", "kernel-devel", "ks=cdrom:/ks.cfg"},
-      {"rhel7-64", GUESS_VERSION_RHEL_SERVER, nullptr, 3, false, true, false, true,
-       "#key --skip", "gcc", "@guest-desktop-agents", "ks=cdrom:/ks.cfg"},
+      {"rhel7-64", GUESS_VERSION_RHEL_SERVER, nullptr, 3, false, true, false, true, "#key --skip",
+       "gcc", "@guest-desktop-agents", "ks=cdrom:/ks.cfg"},
       {"rhel7-64", GUESS_VERSION_RHEL_WORKSTATION, nullptr, 3, false, true, false, true,
        "#key --skip", "gcc", "@x11", "ks=cdrom:/ks.cfg"},
       {"rhel8-64", GUESS_VERSION_RHEL_WORKSTATION, nullptr, 3, false, true, false, false,
@@ -233,8 +233,8 @@ TEST_F(LinuxAnswers, KickstartChoices) {
        "@ X Window System", "@ Development Tools", "ks=cdrom:/ks.cfg"},
       {"centos5", GUESS_VERSION_CENTOS_5, nullptr, 1, false, false, false, true, "key --skip",
        "@ X Window System", "@ Development Tools", "ks=cdrom:/ks.cfg"},
-      {"fedora", GUESS_VERSION_FEDORA_9_TO_12, nullptr, 1, false, false, false, true,
-       "#key --skip", "@ X Window System", "@ Fonts", "ks=cdrom:/ks.cfg"},
+      {"fedora", GUESS_VERSION_FEDORA_9_TO_12, nullptr, 1, false, false, false, true, "#key --skip",
+       "@ X Window System", "@ Fonts", "ks=cdrom:/ks.cfg"},
       {"fedora-64", GUESS_VERSION_FEDORA_14_TO_16, nullptr, 1, false, true, true, true,
        "#key --skip", "@ X Window System", "@ Fonts", "ks=cdrom:/ks.cfg"},
       {"fedora-64", GUESS_VERSION_FEDORA_17, nullptr, 1, false, true, true, true, "#key --skip",
@@ -268,8 +268,8 @@ TEST_F(LinuxAnswers, KickstartChoices) {
     EXPECT_TRUE(HasLine(t, row.modern ? "zerombr #yes" : "zerombr yes"));
     EXPECT_TRUE(HasLine(t, row.modern ? "xconfig --startxonboot #--resolution=800x600"
                                       : "xconfig --startxonboot --resolution=800x600"));
-    EXPECT_TRUE(HasLine(t, std::string(row.biosboot ? "" : "#") +
-                               "part biosboot --fstype=biosboot --size=1"));
+    EXPECT_TRUE(HasLine(
+        t, std::string(row.biosboot ? "" : "#") + "part biosboot --fstype=biosboot --size=1"));
     EXPECT_TRUE(HasLine(t, row.python ? "python" : "#python"));
     EXPECT_TRUE(HasLine(t, row.keyLine));
     EXPECT_TRUE(HasLine(t, "poweroff"));
@@ -281,7 +281,9 @@ TEST_F(LinuxAnswers, KickstartChoices) {
     ASSERT_LT(i + 1, lines.size());
     EXPECT_EQ(lines[i + 1], row.firstPackage);
     size_t j = i + 1;
-    while (j + 1 < lines.size() && !lines[j + 1].empty() && lines[j + 1].find("%end") == std::string::npos) ++j;
+    while (j + 1 < lines.size() && !lines[j + 1].empty() &&
+           lines[j + 1].find("%end") == std::string::npos)
+      ++j;
     EXPECT_EQ(lines[j], row.lastPackage);
     // Both %end lines share one switch.
     size_t ends = 0, active = 0;
@@ -384,16 +386,19 @@ TEST_F(LinuxAnswers, FailuresLeaveNothingBehind) {
       {"Ubuntu user with a digit first", "ubuntu-64", "9lives", "Jo", "p", "r", nullptr,
        "the user name is refused: only a-z, 0-9 and '-' are allowed, and it must begin with a "
        "letter\n"},
-      {"line break in the full name", "ubuntu-64", "jo", "Jo\nd-i preseed/late_command string reboot",
-       "p", "r", nullptr, "the full name is refused: it holds a control character\n"},
+      {"line break in the full name", "ubuntu-64", "jo",
+       "Jo\nd-i preseed/late_command string reboot", "p", "r", nullptr,
+       "the full name is refused: it holds a control character\n"},
       {"full name ending in a backslash", "ubuntu-64", "jo", "Jo \\", "p", "r", nullptr,
        "the full name is refused: it ends in a backslash\n"},
       {"Latin-1 full name", "sles11-64", "jo", "Zo\xeb", "p", "r", nullptr,
        "the full name is refused: it is not valid UTF-8 text\n"},
       {"surrogate in UTF-8", "sles11-64", "jo", "\xed\xa0\x80", "p", "r", nullptr,
        "the full name is refused: it is not valid UTF-8 text\n"},
-      {"C1 control", "sles11-64", "jo", "a\xc2\x85" "b", "p", "r", nullptr,
-       "the full name is refused: it holds a control character\n"},
+      {"C1 control", "sles11-64", "jo",
+       "a\xc2\x85"
+       "b",
+       "p", "r", nullptr, "the full name is refused: it holds a control character\n"},
       {"U+FFFE", "sles11-64", "jo", "\xef\xbf\xbe", "p", "r", nullptr,
        "the full name is refused: it is not valid UTF-8 text\n"},
       {"key with a line break", "rhel5", "jo", "Jo", "p", "r", "x\n%post\nreboot",
@@ -404,9 +409,8 @@ TEST_F(LinuxAnswers, FailuresLeaveNothingBehind) {
   for (const auto &c : kCases) {
     SCOPED_TRACE(c.what);
     tvxtest::LogCapture log;
-    EXPECT_FALSE(AutoInstall_PrepareAnswerFileEx_Linux(c.guestOS, 0, out.c_str(), c.user,
-                                                       c.fullName, c.password, c.root, c.key,
-                                                       FALSE, 0, FALSE));
+    EXPECT_FALSE(AutoInstall_PrepareAnswerFileEx_Linux(
+        c.guestOS, 0, out.c_str(), c.user, c.fullName, c.password, c.root, c.key, FALSE, 0, FALSE));
     EXPECT_FALSE(fs::exists(dir_.Path() + "/out"));
     if (c.log[0] != '\0') {
       ASSERT_FALSE(log.Lines().empty());
@@ -421,15 +425,16 @@ TEST_F(LinuxAnswers, FailuresLeaveNothingBehind) {
   fs::create_directories(dir_.Path() + "/ub");
   std::ofstream(dir_.Path() + "/ub/custom") << "x";
   EXPECT_FALSE(AutoInstall_PrepareAnswerFileEx_Linux("ubuntu-64", GUESS_VERSION_UBUNTU_1404,
-                                                     (dir_.Path() + "/ub").c_str(), "jo", "Jo",
-                                                     "p", "r", nullptr, FALSE, 0, FALSE));
+                                                     (dir_.Path() + "/ub").c_str(), "jo", "Jo", "p",
+                                                     "r", nullptr, FALSE, 0, FALSE));
   EXPECT_EQ(Read(dir_.Path() + "/ub/custom"), "x");
-  EXPECT_EQ(std::distance(fs::directory_iterator(dir_.Path() + "/ub"), fs::directory_iterator()), 1);
+  EXPECT_EQ(std::distance(fs::directory_iterator(dir_.Path() + "/ub"), fs::directory_iterator()),
+            1);
   // Under an output directory that cannot be made, nothing appears.
   std::ofstream(dir_.Path() + "/plainfile") << "x";
-  EXPECT_FALSE(AutoInstall_PrepareAnswerFileEx_Linux(
-      "sles11-64", 0, (dir_.Path() + "/plainfile/sub").c_str(), "jo", "Jo", "p", "r", nullptr,
-      FALSE, 0, FALSE));
+  EXPECT_FALSE(AutoInstall_PrepareAnswerFileEx_Linux("sles11-64", 0,
+                                                     (dir_.Path() + "/plainfile/sub").c_str(), "jo",
+                                                     "Jo", "p", "r", nullptr, FALSE, 0, FALSE));
   EXPECT_EQ(Read(dir_.Path() + "/plainfile"), "x");
 }
 
