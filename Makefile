@@ -8,7 +8,7 @@ BENCH_DIR   := $(BUILD_DIR)/bench
 JOBS        ?= $(shell nproc)
 CMAKE_GEN   := -G Ninja
 
-.PHONY: all deps release asan demo check test fuzz bench install clean
+.PHONY: all deps release asan demo check test e2e fuzz bench install clean
 
 all: release
 
@@ -35,6 +35,11 @@ demo: release
 check: asan
 	@scripts/demo $(ASAN_DIR)
 	cd $(ASAN_DIR) && ctest --output-on-failure -j $(JOBS) --timeout 600
+	@if command -v qemu-system-x86_64 >/dev/null; then scripts/e2e/run $(ASAN_DIR); fi
+
+# The unattended-install media booted in qemu (see scripts/e2e/run).
+e2e: asan
+	@scripts/e2e/run $(ASAN_DIR)
 
 test: check
 

@@ -22,6 +22,7 @@
 #include "tvx_guess.h"
 #include "tvx_log.h"
 #include "unattended_common.h"
+#include "unattended_linux_media.h"
 
 namespace tvxcli {
 namespace {
@@ -49,15 +50,20 @@ void PrintHelp() {
       "  --power-off              power the guest off after the install (default: reboot)\n"
       "  --nvme                   the guest's disk is NVMe (Ubuntu)\n"
       "  --out DIR                output directory (required)\n"
+      "  --media DIR              then make the guest's medium in DIR: autoinst.flp and/or\n"
+      "                           autoinst.iso (the install medium's boot tree)\n"
+      "%s"
       "  --json                   print one JSON object instead of text\n"
       "  -h, --help               show this help\n\n"
       "Exit status: 0 written, 1 not recognised or not written, 2 IMAGE cannot be\n"
-      "opened, 64 usage error.\n");
+      "opened, 64 usage error.\n",
+      kLinuxMediaHelp);
 }
 
 struct Options {
   std::string user, fullName, password, rootPassword, key, out, image;
   bool haveRoot = false, haveKey = false, powerOff = false, nvme = false, json = false;
+  LinuxMediaOptions media;
 };
 
 bool ReadFirstLine(const std::string &path, std::string *out) {
@@ -114,6 +120,10 @@ int Parse(const std::vector<std::string> &args, Options *o) {
       v.given = known = true;
     }
     if (known) continue;
+    if (int taken = TakeLinuxMediaOption(kName, args, &i, &o->media)) {
+      if (taken != 1) return taken;
+      continue;
+    }
     if (a.size() > 1 && a[0] == '-') return UsageError(kName, "unknown option '" + a + "'");
     positional.push_back(a);
   }
@@ -257,6 +267,7 @@ int Run(const std::vector<std::string> &args) {
     ok = false;
     log.push_back("cannot move the answer file into " + o.out + ": " + error);
   }
+  ok = ok && ContinueWithMedia(o.image, guess, o.out, o.media, o.json, &files, &log);
 
   const char *versionName =
       guess.version < GUESS_VERSION_DUMMY_LAST

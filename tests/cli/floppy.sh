@@ -1,0 +1,75 @@
+#!/usr/bin/env bash
+# tvxguest floppy and unattended windows --floppy: every image the tool writes
+# is checked with fsck.fat and read back with mtools; exit statuses.
+set -uo pipefail
+tool=${TVX_TOOL:?} media=${TVX_MEDIA_DIR:?} src=${TVX_SOURCE_DIR:?}
+fail=0
+check() {  # check WHAT COND...
+  local what=$1; shift
+  if "$@"; then echo "ok: $what"; else echo "FAIL: $what"; fail=1; fi
+}
+if ! "$tool" floppy --help >/dev/null 2>&1; then
+  echo "skip: this tool has no 'floppy' command"
+  exit 0
+fi
+tmp=$(mktemp -d)
+trap 'rm -rf "$tmp"' EXIT
+export MTOOLS_SKIP_CHECK=1
+clean() { fsck.fat -n "$1" >"$tmp/fsck" 2>&1 && ! grep -qE 'rror|ong file|ree cluster|Fix|orrect' "$tmp/fsck"; }
+img=$tmp/f.flp
+
+"$tool" floppy format "$img" >/dev/null
+check "format: a 1.44 MB image" test "$(stat -c %s "$img")" -eq 1474560
+head -c 513 /dev/urandom >"$tmp/odd.bin"
+head -c 5000 /dev/urandom >"$tmp/big.bin"
+: >"$tmp/empty"
+"$tool" floppy add "$img" "$tmp/big.bin" "Driver Notes.txt" &&
+  "$tool" floppy add "$img" "$tmp/odd.bin" "driver notes.TXT" &&  # replaces, shorter
+  "$tool" floppy add "$img" "$tmp/empty"
+check "add: exit 0" test $? -eq 0
+check "fsck.fat finds the image clean" clean "$img"
+mcopy -n -i "$img" "::/Driver Notes.txt" "$tmp/back" && cmp -s "$tmp/back" "$tmp/odd.bin"
+check "mtools reads the replaced file, no tail" test $? -eq 0
+"$tool" floppy get "$img" "DRIVER NOTES.TXT" >"$tmp/out" && cmp -s "$tmp/out" "$tmp/odd.bin"
+check "get to standard output" test $? -eq 0
+"$tool" floppy ls --json "$img" >"$tmp/json"
+check "ls --json: names, sizes and free room" /usr/bin/python3 -c '
+import json, sys
+o = json.load(open(sys.argv[1]))
+sizes = {e["name"]: e["size"] for e in o["entries"]}
+assert sizes == {"Driver Notes.txt": 513, "empty": 0}, sizes
+assert o["freeBytes"] == (2847 - 2) * 512, o["freeBytes"]' "$tmp/json"
+
+"$tool" floppy format "$img" >/dev/null 2>&1
+check "format refuses an existing image without --force" test $? -eq 1
+"$tool" floppy ls "$tmp/big.bin" >/dev/null 2>&1
+check "ls of a non-FAT file: exit 2" test $? -eq 2
+"$tool" floppy add "$img" >/dev/null 2>&1
+check "add without a file: exit 64" test $? -eq 64
+
+winxp=$media/windows-legacy/winxppro.iso
+if [ -e "$winxp" ]; then
+  mkdir -p "$tmp/res" "$tmp/drv"
+  printf '@echo off\r\n' >"$tmp/res/unattend.cmd"
+  printf 'MZ' >"$tmp/res/storePwd.exe"
+  printf '[scsi]\r\nLSI_SAS_32 = "LSI SAS Adapter"\r\n' >"$tmp/drv/txtsetup.oem"
+  printf 'driver' >"$tmp/drv/lsi_sas.sys"
+  tpl=$src/data/windows
+  "$tool" unattended windows --sif "$tpl/winnt.sif" --xml "$tpl/autounattend.xml" \
+    --storepwd "$tpl/storePwd.ini" --image-name "Windows XP Professional" --full-name Jo \
+    --out "$tmp/xp" --floppy --resource-dir "$tmp/res" --scsi-dir "$tmp/drv" "$winxp" >"$tmp/out" 2>&1
+  check "unattended windows --floppy: exit 0" test $? -eq 0
+  check "only autoinst.flp stays" test "$(ls "$tmp/xp")" = autoinst.flp
+  check "the floppy is clean" clean "$tmp/xp/autoinst.flp"
+  mdir -b -i "$tmp/xp/autoinst.flp" ::/ >"$tmp/names"
+  check "mtools lists answer files, helpers and drivers" test "$(sort "$tmp/names" | tr '\n' ' ')" = \
+    "::/autoun~0.xml ::/lsi_sas.sys ::/storePwd.exe ::/storePwd.ini ::/txtsetup.oem ::/unattend.cmd ::/winnt.sif "
+  mcopy -n -i "$tmp/xp/autoinst.flp" ::/winnt.sif "$tmp/sif"
+  check "winnt.sif names the driver" grep -qx '"LSI SAS Adapter"=OEM' "$tmp/sif"
+  "$tool" unattended windows --sif a --xml b --image-name c --full-name d --out "$tmp/n" \
+    --floppy "$winxp" >/dev/null 2>&1
+  check "--floppy without --resource-dir: exit 64" test $? -eq 64
+else
+  echo "skip: $winxp not mastered"
+fi
+exit $fail

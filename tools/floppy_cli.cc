@@ -1,0 +1,116 @@
+#include "floppy_cli.h"
+
+#include <algorithm>
+#include <filesystem>
+
+#include "command.h"
+#include "tvx_fat.h"
+#include "tvx_floppy.h"
+#include "tvx_log.h"
+
+namespace tvxcli {
+
+namespace {
+
+void Collect(TvxLogLevel, const char *text, void *ctx) {
+  std::string line = text;
+  if (!line.empty() && line.back() == '\n') line.pop_back();
+  static_cast<std::vector<std::string> *>(ctx)->push_back(line);
+}
+
+}  // namespace
+
+LogLines::LogLines() {
+  if (!Verbose()) Tvx_SetLogSink(Collect, &lines_);
+}
+
+LogLines::~LogLines() {
+  if (!Verbose()) Tvx_SetLogSink(nullptr, nullptr);
+}
+
+void LogLines::Print(std::FILE *to) const {
+  for (const std::string &line : lines_) std::fprintf(to, "  %s\n", line.c_str());
+}
+
+const char *FatErrorText(unsigned long code) {
+  switch (code) {
+    case FAT_OK: return "success";
+    case FAT_ERR_IO: return "cannot be opened, read or written";
+    case FAT_ERR_CORRUPT: return "not a FAT volume, or damaged";
+    case FAT_ERR_UNSUPPORTED: return "not supported (FAT32, over 64 MiB, or an unknown floppy size)";
+    case FAT_ERR_NOT_FOUND: return "no such file";
+    case FAT_ERR_EXISTS: return "the name is taken";
+    case FAT_ERR_NO_SPACE: return "no room left";
+    case FAT_ERR_BAD_NAME: return "a name FAT cannot hold";
+    default: return "failed";
+  }
+}
+
+int WindowsFloppyOptions::Take(const char *cmd, const std::vector<std::string> &args, size_t *i) {
+  const std::string &a = args[*i];
+  if (a == "--floppy") {
+    wanted = true;
+    return kTaken;
+  }
+  struct Valued {
+    const char *flag;
+    std::string *value;
+  };
+  const Valued valued[] = {
+      {"--base-floppy", &base},        {"--tools-iso", &toolsIso},
+      {"--scsi-dir", &scsiDir},        {"--upgrader-dir", &upgraderDir},
+      {"--resource-dir", &resourceDir},
+  };
+  for (const Valued &v : valued) {
+    std::string flag = v.flag;
+    if (a == flag) {
+      if (*i + 1 >= args.size()) return UsageError(cmd, a + " needs a value");
+      *v.value = args[++*i];
+      return kTaken;
+    }
+    if (a.rfind(flag + "=", 0) == 0) {
+      *v.value = a.substr(flag.size() + 1);
+      return kTaken;
+    }
+  }
+  return kNotMine;
+}
+
+int WindowsFloppyOptions::Check(const char *cmd) const {
+  bool any = !base.empty() || !toolsIso.empty() || !scsiDir.empty() || !upgraderDir.empty() ||
+             !resourceDir.empty();
+  if (any && !wanted) return UsageError(cmd, "the floppy options need --floppy");
+  if (wanted && resourceDir.empty()) return UsageError(cmd, "--floppy needs --resource-dir");
+  return -1;
+}
+
+bool WindowsFloppyOptions::Make(const std::string &outDir) const {
+  auto opt = [](const std::string &s) { return s.empty() ? nullptr : s.c_str(); };
+  return AutoInstall_MakeFloppyImg(opt(base), outDir.c_str(), opt(toolsIso), opt(scsiDir),
+                                   opt(upgraderDir), resourceDir.c_str()) != FALSE;
+}
+
+std::vector<std::string> WindowsFloppyOptions::Files(const std::string &outDir) const {
+  std::vector<std::string> files;
+  std::error_code ec;
+  for (const auto &e : std::filesystem::directory_iterator(outDir, ec)) {
+    files.push_back(e.path().string());
+  }
+  std::sort(files.begin(), files.end());
+  return files;
+}
+
+const char *WindowsFloppyOptions::Help() {
+  return "\nFloppy for Windows 2000, XP and Server 2003 setup:\n"
+         "  --floppy              pack the answer files into DIR/autoinst.flp (they are\n"
+         "                        removed from DIR), with the helpers of --resource-dir\n"
+         "  --resource-dir DIR    unattend.cmd, storePwd.exe and the driver floppy\n"
+         "                        tvxscsi.flp (required with --floppy)\n"
+         "  --base-floppy FILE    start from a copy of this image instead of a blank one\n"
+         "  --tools-iso FILE      the guest-tools ISO image\n"
+         "  --scsi-dir PATH       mass-storage driver set: a folder inside --tools-iso, or\n"
+         "                        a host folder without it\n"
+         "  --upgrader-dir PATH   folder inside --tools-iso holding the tools upgrader\n";
+}
+
+}  // namespace tvxcli

@@ -1,0 +1,75 @@
+// The medium a Linux guest's installer reads its answer file from, for the
+// `unattended` subcommands: "autoinst.flp", or the boot tree mastered into
+// "autoinst.iso".
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "tvx_guess.h"
+
+namespace tvxcli {
+
+struct LinuxMediaOptions {
+  std::string mediaDir;     // --media: where autoinst.iso / autoinst.flp go
+  std::string mkisofs;      // --mkisofs (empty: DefaultMkisofs())
+  std::string isolinuxBin;  // --isolinux-bin (empty: the medium's)
+  std::string templateDir;  // --floppy-templates: suse.flp, mandriva.flp
+  std::string toolsDir;     // --tools: guest-tools installer files for the CD
+};
+
+// TakeLinuxMediaOption consumes the media option at args[*i] ("--media DIR"
+// or "--media=DIR", ...): 1 taken, 0 not a media option, or the exit status
+// of a usage error (64) for a missing value.
+int TakeLinuxMediaOption(const char *cmd, const std::vector<std::string> &args, size_t *i,
+                         LinuxMediaOptions *o);
+
+// The help lines of the media options.
+extern const char kLinuxMediaHelp[];
+
+// DefaultMkisofs: the first of genisoimage and xorrisofs found in PATH, or "".
+std::string DefaultMkisofs();
+
+// IsDirectory: `path` names a directory (an unpacked medium).
+bool IsDirectory(const std::string &path);
+
+// ScanMedium runs AutoInstall_ScanDisk for a directory, else
+// AutoInstall_ScanISO.
+bool ScanMedium(const std::string &medium, const std::string &outDir, const char *guestOS,
+                unsigned version, const std::string &isolinuxBin);
+
+// MakeLinuxMedia builds the media for the answer file prepared in
+// `answerDir`, into mediaDir: for the Red Hat family the boot tree of
+// `medium` (image or directory) with ks.cfg and the tools, mastered into
+// autoinst.iso; for floppy guests autoinst.flp and, when the medium boots
+// through isolinux, an autoinst.iso whose arguments point at the floppy (its
+// absence is only a note). Appends the files made to `out_files`; false on
+// failure (the library's log lines say why).
+bool MakeLinuxMedia(const std::string &medium, const GuessResult &guess,
+                    const std::string &answerDir, const LinuxMediaOptions &o,
+                    std::vector<std::string> *out_files, std::vector<std::string> *out_notes);
+
+// ContinueWithMedia is the `--media` step of `unattended linux`: nothing to
+// do without --media; else MakeLinuxMedia with the library's log lines
+// collected into `log` (notes go there too, and to standard error unless
+// `json`).
+bool ContinueWithMedia(const std::string &medium, const GuessResult &guess,
+                       const std::string &answerDir, const LinuxMediaOptions &o, bool json,
+                       std::vector<std::string> *files, std::vector<std::string> *log);
+
+// LogCapture collects the library's log lines while it lives (unless -v
+// shows them as they come).
+class LogCapture {
+ public:
+  LogCapture();
+  ~LogCapture();
+  LogCapture(const LogCapture &) = delete;
+  LogCapture &operator=(const LogCapture &) = delete;
+  const std::vector<std::string> &Lines() const { return lines_; }
+
+ private:
+  std::vector<std::string> lines_;
+  bool active_;
+};
+
+}  // namespace tvxcli
