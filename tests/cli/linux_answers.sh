@@ -68,16 +68,16 @@ if usable "$sles"; then
     "$(xmllint --xpath "string((//*[local-name()='user_password'])[1])" "$xml")"
 fi
 
-# A failure (no answer file for Debian) leaves nothing behind,
-# not even the staging directory beside --out.
+# A failure (no answer file for Debian) leaves nothing in --out and no
+# staging directory beside it.
 debian=$media/debian/deb11-amd64.iso
 if usable "$debian"; then
   answers "$tmp/f/deb" "$debian" >/dev/null 2>"$tmp/err"
   check "debian: exit 1" test $? -eq 1
   check "debian: says why" grep -q 'no Linux answer file is made for debian11-64' "$tmp/err"
 fi
-check "failures leave nothing" test ! -e "$tmp/f"
-check "no staging directory left" test -z "$(find "$tmp" -name '.tvxguest-stage-*')"
+check "failures leave nothing in --out" test ! -e "$tmp/f/deb"
+check "no staging directory left" test -z "$(find "$tmp" -name '*.staging-*')"
 "$tool" unattended linux --full-name x --password p --out "$tmp/u" "$centos" >/dev/null 2>&1
 check "missing --user: exit 64" test $? -eq 64
 
