@@ -45,10 +45,8 @@ ubuntu=$media/debian/ubu-2004.iso
 if usable "$ubuntu"; then
   answers "$tmp/ub" "$ubuntu" --nvme --json >"$tmp/json" 2>&1
   check "ubuntu --json: exit 0" test $? -eq 0
-  check "ubuntu --json: the preseed file" /usr/bin/python3 -c '
-import json, sys
-o = json.load(open(sys.argv[1]))
-assert o["result"] is True and o["files"] == [sys.argv[2]], o' "$tmp/json" "$tmp/ub/custom/preseed.cfg"
+  check "ubuntu --json: the preseed file" \
+    grep -qF "\"files\": [\"$tmp/ub/custom/preseed.cfg\"]" "$tmp/json"
   ps=$tmp/ub/custom/preseed.cfg
   check "ubuntu: debconf reads the file" debconf-set-selections -c "$ps"
   check "ubuntu: full name as typed" \

@@ -204,14 +204,11 @@ TEST_F(LinuxAnswers, KickstartChoices) {
     const char *guestOS;
     GuessVersion version;
     const char *key;
-    int tmpl;     // 1, 2, 3
-    bool old;     // langsupport, mouse, --resolvedeps, empty zerombr switch
-    bool modern;  // %end active, zerombr and xconfig commented
-    bool biosboot;
-    bool python;
-    const char *keyLine;
-    const char *firstPackage, *lastPackage;
-    const char *argument;
+    int tmpl;  // 1, 2, 3
+    // old: langsupport, mouse, --resolvedeps, empty zerombr switch;
+    // modern: %end active, zerombr and xconfig commented.
+    bool old, modern, biosboot, python;
+    const char *keyLine, *firstPackage, *lastPackage, *argument;
   } kRows[] = {
       {"asianux3", GUESS_VERSION_UNKNOWN, nullptr, 1, false, false, false, true, "#key --skip",
        "@ base-x", "@ kde-desktop", "ks=cdrom:/ks.cfg"},
