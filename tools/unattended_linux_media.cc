@@ -76,31 +76,54 @@ bool ScanMedium(const std::string &medium, const std::string &outDir, const char
 
 namespace {
 
-// MakeBootCd stages the boot tree (answer file and tools included) inside
-// the media directory, on the same file system, and masters it into
-// autoinst.iso; the tree is gone afterwards either way.
+namespace fs = std::filesystem;
+
+// Staging is a private directory inside the media directory (one file
+// system, so finished media are renamed into place); it goes with whatever
+// is left in it, so a failed run adds nothing to the media directory.
+class Staging {
+ public:
+  explicit Staging(const std::string &dir) : path_((fs::path(dir) / ".autoinst.XXXXXX").string()) {
+    if (::mkdtemp(path_.data()) == nullptr) path_.clear();
+  }
+  ~Staging() {
+    std::error_code ec;
+    if (!path_.empty()) fs::remove_all(path_, ec);
+  }
+  Staging(const Staging &) = delete;
+  Staging &operator=(const Staging &) = delete;
+  const std::string &Path() const { return path_; }
+  // Commit moves the staged file `name` into `dir`.
+  bool Commit(const char *name, const std::string &dir, std::vector<std::string> *files) {
+    std::error_code ec;
+    fs::path to = fs::path(dir) / name;
+    fs::rename(fs::path(path_) / name, to, ec);
+    if (ec) return false;
+    files->push_back(to.string());
+    return true;
+  }
+
+ private:
+  std::string path_;
+};
+
+// MakeBootCd builds the boot tree (answer file and tools included) in the
+// staging directory and masters it into autoinst.iso there.
 bool MakeBootCd(const std::string &medium, const GuessResult &guess,
-                const std::string &answerFile, const LinuxMediaOptions &o) {
-  namespace fs = std::filesystem;
+                const std::string &answerFile, const LinuxMediaOptions &o,
+                const std::string &stage) {
   std::string mkisofs = o.mkisofs.empty() ? DefaultMkisofs() : o.mkisofs;
   if (mkisofs.empty()) {
     std::fprintf(stderr, "tvxguest: no ISO mastering tool found (genisoimage, xorrisofs)\n");
     return false;
   }
-  std::string tree = (fs::path(o.mediaDir) / ".autoinst-tree.XXXXXX").string();
-  if (::mkdtemp(tree.data()) == nullptr) {
-    std::fprintf(stderr, "tvxguest: cannot create a directory in %s\n", o.mediaDir.c_str());
-    return false;
-  }
+  std::string tree = (fs::path(stage) / "tree").string();
   std::error_code ec;
-  if (!answerFile.empty()) fs::copy_file(answerFile, fs::path(tree) / "ks.cfg", ec);
-  bool ok = !ec && ScanMedium(medium, tree, guess.guestOS, guess.version, o.isolinuxBin) &&
-            (o.toolsDir.empty() || AutoInstall_AddTools_Linux(tree.c_str(), o.toolsDir.c_str()));
-  if (!ok) {
-    fs::remove_all(tree, ec);
-    return false;
-  }
-  return AutoInstall_MasterISO(tree.c_str(), mkisofs.c_str(), o.mediaDir.c_str());
+  fs::create_directory(tree, ec);
+  if (!ec && !answerFile.empty()) fs::copy_file(answerFile, fs::path(tree) / "ks.cfg", ec);
+  return !ec && ScanMedium(medium, tree, guess.guestOS, guess.version, o.isolinuxBin) &&
+         (o.toolsDir.empty() || AutoInstall_AddTools_Linux(tree.c_str(), o.toolsDir.c_str())) &&
+         AutoInstall_MasterISO(tree.c_str(), mkisofs.c_str(), stage.c_str());
 }
 
 }  // namespace
@@ -108,29 +131,29 @@ bool MakeBootCd(const std::string &medium, const GuessResult &guess,
 bool MakeLinuxMedia(const std::string &medium, const GuessResult &guess,
                     const std::string &answerDir, const LinuxMediaOptions &o,
                     std::vector<std::string> *out_files, std::vector<std::string> *out_notes) {
-  namespace fs = std::filesystem;
   std::error_code ec;
   fs::create_directories(o.mediaDir, ec);
-  std::string iso = (fs::path(o.mediaDir) / "autoinst.iso").string();
-  if (!AutoInstall_NeedsFloppy_Linux(guess.guestOS)) {
-    if (!MakeBootCd(medium, guess, (fs::path(answerDir) / "ks.cfg").string(), o)) return false;
-    out_files->push_back(iso);
-    return true;
+  Staging stage(o.mediaDir);
+  if (stage.Path().empty()) {
+    std::fprintf(stderr, "tvxguest: cannot create a directory in %s\n", o.mediaDir.c_str());
+    return false;
   }
-  if (!AutoInstall_MakeFloppyImg_Linux(answerDir.c_str(), o.mediaDir.c_str(),
+  if (!AutoInstall_NeedsFloppy_Linux(guess.guestOS)) {
+    return MakeBootCd(medium, guess, (fs::path(answerDir) / "ks.cfg").string(), o,
+                      stage.Path()) &&
+           stage.Commit("autoinst.iso", o.mediaDir, out_files);
+  }
+  if (!AutoInstall_MakeFloppyImg_Linux(answerDir.c_str(), stage.Path().c_str(),
                                        o.templateDir.c_str(), guess.guestOS)) {
     return false;
   }
-  out_files->push_back((fs::path(o.mediaDir) / "autoinst.flp").string());
   // The floppy guest boots the same kind of CD, whose arguments send the
   // installer to the floppy; without one the arguments are typed at the
   // medium's own boot prompt.
-  if (MakeBootCd(medium, guess, "", o)) {
-    out_files->push_back(iso);
-  } else {
-    out_notes->push_back("no boot CD: the medium's isolinux boot tree could not be copied");
-  }
-  return true;
+  bool cd = MakeBootCd(medium, guess, "", o, stage.Path());
+  if (!cd) out_notes->push_back("no boot CD: the medium's isolinux boot tree could not be copied");
+  return stage.Commit("autoinst.flp", o.mediaDir, out_files) &&
+         (!cd || stage.Commit("autoinst.iso", o.mediaDir, out_files));
 }
 
 bool ContinueWithMedia(const std::string &medium, const GuessResult &guess,

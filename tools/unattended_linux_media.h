@@ -43,8 +43,10 @@ bool ScanMedium(const std::string &medium, const std::string &outDir, const char
 // `medium` (image or directory) with ks.cfg and the tools, mastered into
 // autoinst.iso; for floppy guests autoinst.flp and, when the medium boots
 // through isolinux, an autoinst.iso whose arguments point at the floppy (its
-// absence is only a note). Appends the files made to `out_files`; false on
-// failure (the library's log lines say why).
+// absence is only a note). Everything is made in a private directory inside
+// mediaDir and moved into place at the end, so a failure adds nothing there.
+// Appends the files made to `out_files`; false on failure (the library's log
+// lines say why).
 bool MakeLinuxMedia(const std::string &medium, const GuessResult &guess,
                     const std::string &answerDir, const LinuxMediaOptions &o,
                     std::vector<std::string> *out_files, std::vector<std::string> *out_notes);
