@@ -64,6 +64,27 @@ for out in suse-iso suse-tree; do
     "$tmp/$out/isolinux/isolinux.cfg"
 done
 
+# Ubuntu 16.04 keeps its entries in txt.cfg, included from an isolinux.cfg
+# that has none: the other .cfg files of that directory are tried in order.
+u16=$tmp/ubuntu1604
+mkdir -p "$u16/isolinux" "$u16/casper"
+printf 'include menu.cfg\ndefault vesamenu.c32\nprompt 0\n' >"$u16/isolinux/isolinux.cfg"
+printf 'menu title Ubuntu\n' >"$u16/isolinux/menu.cfg"
+printf 'default live\nlabel live\n  kernel /casper/vmlinuz.efi\n  append  file=/cdrom/preseed/ubuntu.seed boot=casper initrd=/casper/initrd.lz quiet splash ---\n' \
+  >"$u16/isolinux/txt.cfg"
+printf 'K-1604' >"$u16/casper/vmlinuz.efi"
+printf 'I-1604' >"$u16/casper/initrd.lz"
+cp "$bin" "$ldlinux" "$u16/isolinux/"
+master "$u16" "$tmp/ubuntu1604.iso"
+for src in "$u16" "$tmp/ubuntu1604.iso"; do
+  rm -rf "$tmp/u16"
+  "$tool" unattended scan --guest-os ubuntu-64 --out "$tmp/u16" "$src" >/dev/null 2>&1
+  check "Ubuntu 16.04 $(basename "$src"): entry from txt.cfg" \
+    grep -qx $'\tappend initrd=initrd.lz file=/cdrom/preseed/ubuntu.seed boot=casper quiet splash ---  debian-installer/custom-installation=/custom find_preseed=/preseed.cfg auto preseed/file=/floppy/preseed.cfg automatic-ubiquity noprompt priority=critical locale=en_US console-setup/modelcode=evdev' \
+    "$tmp/u16/isolinux/isolinux.cfg"
+  check "Ubuntu 16.04 $(basename "$src"): casper kernel" cmp -s "$u16/casper/vmlinuz.efi" "$tmp/u16/isolinux/vmlinuz.efi"
+done
+
 # Ubuntu 20.10 has no isolinux: the casper defaults and the caller's loader,
 # whose ldlinux.c32 comes from the host's syslinux.
 ubu=$tmp/ubuntu
