@@ -121,11 +121,12 @@ if "$tool" unattended linux --help >/dev/null 2>&1; then
     sh -c 'isoinfo -d -i "$1" | grep -q "El Torito"' - "$media/autoinst.iso"
   check "ks.cfg at the root of autoinst.iso" \
     sh -c 'isoinfo -i "$1" -x "/KS.CFG;1" | grep -qF "rootpw --iscrypted \$5\$"' - "$media/autoinst.iso"
-  check "the staging directory is gone" test -z "$(find "$media" -mindepth 1 -name '.autoinst*')"
+  check "the media directory holds autoinst.iso alone" test "$(ls -A "$media")" = autoinst.iso
   "$tool" unattended linux "${answers[@]}" --out "$tmp/ans2" --media "$tmp/failed" \
     --mkisofs /bin/false "$tmp/centos.iso" >/dev/null 2>&1
   check "a failing mastering tool: exit 1" test $? -eq 1
-  check "... and nothing left in the media directory" test -z "$(ls -A "$tmp/failed")"
+  check "... and nothing left in the media directory" test -z "$(ls -A "$tmp/failed" 2>/dev/null)"
+  check "... nor any staging directory" test -z "$(find "$tmp" -maxdepth 1 -name '.*staging*')"
   ubuiso=$tmp/ubu2004.iso
   mkdir -p "$tmp/u2004/.disk"
   printf 'Ubuntu 20.04.1 LTS "Focal Fossa" - Release amd64 (20200731)' >"$tmp/u2004/.disk/info"
