@@ -6,6 +6,8 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <vector>
+
 namespace tvx {
 
 std::atomic<uint64_t> g_sourceBytesRead{0};
@@ -45,8 +47,23 @@ class CbSource final : public BlockSource {
   ~CbSource() override {
     if (close_ != nullptr) close_(handle_);
   }
+  // Callers' readers see whole 2048-byte sectors: a reader that checks each
+  // block of the image against a hash (the verified tools image) cannot serve
+  // a slice of a block. A widened read that fails (an image whose size is not
+  // a whole number of sectors) is tried again as asked.
   bool ReadAt(uint64_t offset, void *buf, size_t len) override {
     if (len == 0) return true;
+    uint64_t first = offset / kSector * kSector;
+    if (offset > UINT64_MAX - len || offset + len > UINT64_MAX - kSector) return false;
+    uint64_t end = (offset + len + kSector - 1) / kSector * kSector;
+    if (first != offset || end != offset + len) {
+      scratch_.resize(static_cast<size_t>(end - first));
+      if (read_(handle_, scratch_.data(), scratch_.size(), first) != 0) {
+        std::memcpy(buf, scratch_.data() + (offset - first), len);
+        g_sourceBytesRead.fetch_add(scratch_.size(), std::memory_order_relaxed);
+        return true;
+      }
+    }
     if (read_(handle_, buf, len, offset) == 0) return false;
     g_sourceBytesRead.fetch_add(len, std::memory_order_relaxed);
     return true;
@@ -54,9 +71,11 @@ class CbSource final : public BlockSource {
   uint64_t Size() const override { return 0; }
 
  private:
+  static constexpr uint64_t kSector = 2048;
   SourceReadFn read_;
   SourceCloseFn close_;
   void *handle_;
+  std::vector<unsigned char> scratch_;
 };
 
 class MemSource final : public BlockSource {
@@ -78,11 +97,17 @@ class MemSource final : public BlockSource {
 
 BlockSourcePtr OpenFileSource(const char *path) {
   if (path == nullptr) return nullptr;
-  int fd = ::open(path, O_RDONLY | O_CLOEXEC);
+  // Opening a FIFO blocks until a writer comes: open without waiting and
+  // take only what can hold an image, then read in the ordinary blocking way.
+  int fd = ::open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK);
   if (fd < 0) return nullptr;
-  struct stat st;
-  if (::fstat(fd, &st) != 0 || S_ISDIR(st.st_mode)) {
+  struct stat st {};
+  int flags = -1;
+  if (::fstat(fd, &st) != 0 || !(S_ISREG(st.st_mode) || S_ISBLK(st.st_mode)) ||
+      (flags = ::fcntl(fd, F_GETFL)) < 0 || ::fcntl(fd, F_SETFL, flags & ~O_NONBLOCK) != 0) {
+    int err = S_ISREG(st.st_mode) || S_ISBLK(st.st_mode) ? errno : EINVAL;
     ::close(fd);
+    errno = err;
     return nullptr;
   }
   uint64_t size = static_cast<uint64_t>(st.st_size);

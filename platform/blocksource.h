@@ -21,7 +21,9 @@ class BlockSource {
 
 using BlockSourcePtr = std::unique_ptr<BlockSource>;
 
-// OpenFileSource opens a host file read-only; null when it cannot.
+// OpenFileSource opens a host file read-only; null (errno set) when it
+// cannot, or when it is neither a regular file nor a block device (a FIFO or
+// a directory, which could block the caller or hold no image).
 BlockSourcePtr OpenFileSource(const char *path);
 
 using SourceReadFn = unsigned char (*)(void *handle, void *buf, size_t len, uint64_t offset);

@@ -1,24 +1,51 @@
 #include "platform/crypto.h"
 
 #include <openssl/evp.h>
-#include <strings.h>
 
+#include "platform/ascii.h"
 #include "platform/log.h"
+#include "platform/openssl_unique.h"
 
 struct CryptoHash {
   const char *name;
   const char *aliases[2];
-  const EVP_MD *(*md)();
+  const char *fetchName;  // OpenSSL's name of the algorithm
   size_t size;
 };
 
 namespace {
 
 const CryptoHash kHashes[] = {
-    {"SHA-256", {"SHA256", "SHA2-256"}, EVP_sha256, 32},
-    {"SHA-1", {"SHA1", nullptr}, EVP_sha1, 20},
-    {"SHA-512", {"SHA512", "SHA2-512"}, EVP_sha512, 64},
+    {"SHA-256", {"SHA256", "SHA2-256"}, "SHA2-256", 32},
+    {"SHA-1", {"SHA1", nullptr}, "SHA1", 20},
+    {"SHA-512", {"SHA512", "SHA2-512"}, "SHA2-512", 64},
 };
+
+// Fetched is the algorithm's implementation, fetched once per process: the
+// EVP_sha256()-style constants make OpenSSL 3 look the implementation up
+// again on every digest. Null when the provider lacks it.
+const EVP_MD *Fetched(const CryptoHash *hash) {
+  static EVP_MD *const fetched[] = {
+      EVP_MD_fetch(nullptr, kHashes[0].fetchName, nullptr),
+      EVP_MD_fetch(nullptr, kHashes[1].fetchName, nullptr),
+      EVP_MD_fetch(nullptr, kHashes[2].fetchName, nullptr),
+  };
+  static_assert(sizeof fetched / sizeof fetched[0] == sizeof kHashes / sizeof kHashes[0]);
+  return fetched[hash - kHashes];
+}
+
+CryptoError Digest(EVP_MD_CTX *ctx, const CryptoHash *hash, const void *data, size_t len,
+                   uint8_t *out, size_t outSize) {
+  if (outSize != hash->size) return CRYPTO_ERROR_BAD_BUFFER_SIZE;
+  const EVP_MD *md = Fetched(hash);
+  if (md == nullptr) return CRYPTO_ERROR_UNKNOWN_ALGORITHM;
+  unsigned int written = 0;
+  if (EVP_DigestInit_ex2(ctx, md, nullptr) != 1 || EVP_DigestUpdate(ctx, data, len) != 1 ||
+      EVP_DigestFinal_ex(ctx, out, &written) != 1 || written != hash->size) {
+    return CRYPTO_ERROR_OPERATION_FAILED;
+  }
+  return CRYPTO_ERROR_SUCCESS;
+}
 
 EVP_MD_CTX *State(CryptoHashSHA256Context *ctx) { return static_cast<EVP_MD_CTX *>(ctx->state); }
 
@@ -39,8 +66,10 @@ CryptoError CryptoHash_FromString(const char *name, const CryptoHash **out_hash)
   *out_hash = nullptr;
   if (name == nullptr) return CRYPTO_ERROR_UNKNOWN_ALGORITHM;
   for (const auto &h : kHashes) {
-    bool match = strcasecmp(h.name, name) == 0;
-    for (const char *alias : h.aliases) match = match || (alias != nullptr && strcasecmp(alias, name) == 0);
+    bool match = tvx::ascii::Equal(h.name, name);
+    for (const char *alias : h.aliases) {
+      match = match || (alias != nullptr && tvx::ascii::Equal(alias, name));
+    }
     if (match) {
       *out_hash = &h;
       return CRYPTO_ERROR_SUCCESS;
@@ -53,12 +82,20 @@ size_t CryptoHash_GetOutputSize(const CryptoHash *hash) { return hash->size; }
 
 CryptoError CryptoHash_Compute(const CryptoHash *hash, const void *data, size_t len,
                                uint8_t *out, size_t outSize) {
-  if (outSize != hash->size) return CRYPTO_ERROR_BAD_BUFFER_SIZE;
-  unsigned int written = 0;
-  if (EVP_Digest(data, len, out, &written, hash->md(), nullptr) != 1 || written != hash->size) {
-    return CRYPTO_ERROR_OPERATION_FAILED;
-  }
-  return CRYPTO_ERROR_SUCCESS;
+  tvx::UniquePtr<EVP_MD_CTX> ctx(EVP_MD_CTX_new());
+  if (ctx == nullptr) return CRYPTO_ERROR_NOMEM;
+  return Digest(ctx.get(), hash, data, len, out, outSize);
+}
+
+CryptoHashSession::CryptoHashSession(const CryptoHash *hash)
+    : hash_(hash), ctx_(EVP_MD_CTX_new()) {}
+
+CryptoHashSession::~CryptoHashSession() { EVP_MD_CTX_free(static_cast<EVP_MD_CTX *>(ctx_)); }
+
+CryptoError CryptoHashSession::Compute(const void *data, size_t len, uint8_t *out,
+                                       size_t outSize) {
+  if (ctx_ == nullptr) return CRYPTO_ERROR_NOMEM;
+  return Digest(static_cast<EVP_MD_CTX *>(ctx_), hash_, data, len, out, outSize);
 }
 
 void CryptoHash_InitSHA256(CryptoHashSHA256Context *ctx) {

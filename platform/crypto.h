@@ -30,6 +30,23 @@ size_t CryptoHash_GetOutputSize(const CryptoHash *hash);
 CryptoError CryptoHash_Compute(const CryptoHash *hash, const void *data, size_t len,
                                uint8_t *out, size_t outSize);
 
+// CryptoHashSession computes many digests with one algorithm and one reused
+// context: for callers that hash thousands of small blocks, where setting a
+// context up per block would cost as much as the hashing.
+class CryptoHashSession {
+ public:
+  explicit CryptoHashSession(const CryptoHash *hash);
+  ~CryptoHashSession();
+  CryptoHashSession(const CryptoHashSession &) = delete;
+  CryptoHashSession &operator=(const CryptoHashSession &) = delete;
+  // Compute is CryptoHash_Compute on the session's context.
+  CryptoError Compute(const void *data, size_t len, uint8_t *out, size_t outSize);
+
+ private:
+  const CryptoHash *hash_;
+  void *ctx_;  // EVP_MD_CTX, owned
+};
+
 // Streaming SHA-256. Init starts a context, Update feeds it, Final writes the
 // 32-byte digest and ends it (Init again before reuse). A context that is
 // never finished must be ended with CryptoHash_AbortSHA256.

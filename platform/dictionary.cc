@@ -4,12 +4,14 @@
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
-#include <strings.h>
+#include <string_view>
 
+#include "platform/ascii.h"
 #include "platform/dictionary_internal.h"
 #include "platform/fileio.h"
 #include "platform/msg_catalogue.h"
 #include "platform/str.h"
+#include "platform/unique.h"
 #include "platform/util.h"
 
 // Names are formats by design; callers' literals are checked through the
@@ -25,16 +27,14 @@ constexpr uint64_t kMaxFileSize = 64u << 20;
 DictionaryEntry *FindLast(const Dictionary *dict, const char *name) {
   auto &entries = const_cast<Dictionary *>(dict)->entries;
   for (auto it = entries.rbegin(); it != entries.rend(); ++it) {
-    if (strcasecmp(it->name.c_str(), name) == 0) return &*it;
+    if (tvx::ascii::Equal(it->name, name)) return &*it;
   }
   return nullptr;
 }
 
 std::string FormatName(const char *fmt, va_list args) {
-  char *s = Str_Vasprintf(nullptr, fmt, args);
-  std::string out = s != nullptr ? s : "";
-  std::free(s);
-  return out;
+  tvx::CharPtr s(Str_Vasprintf(nullptr, fmt, args));
+  return s ? s.get() : "";
 }
 
 bool Set(Dictionary *dict, const std::string &name, const std::string &value) {
@@ -48,7 +48,7 @@ bool Set(Dictionary *dict, const std::string &name, const std::string &value) {
   // Drop earlier repeats so the value set is the only one a walk sees.
   auto &entries = dict->entries;
   for (size_t i = 0; i + 1 < entries.size();) {
-    if (&entries[i] != last && strcasecmp(entries[i].name.c_str(), name.c_str()) == 0) {
+    if (&entries[i] != last && tvx::ascii::Equal(entries[i].name, name)) {
       entries.erase(entries.begin() + static_cast<std::ptrdiff_t>(i));
       last = FindLast(dict, name.c_str());
     } else {
@@ -108,9 +108,8 @@ Bool Dictionary_LoadFromBuffer(Dictionary *dict, const char *buf, size_t size) {
   MsgList *messages = nullptr;
   bool ok = Load(dict, buf, size, &messages);
   if (!ok) {
-    char *text = MsgList_ToString(messages);
-    MsgPending_Add(text);
-    std::free(text);
+    tvx::CharPtr text(MsgList_ToString(messages));
+    MsgPending_Add(text.get());
   }
   MsgList_Free(messages);
   return ok;
@@ -189,7 +188,7 @@ Bool Dictionary_Get(const Dictionary *dict, const char *name, DictionaryType typ
 Bool Dictionary_Unset(Dictionary *dict, const char *name) {
   size_t before = dict->entries.size();
   std::erase_if(dict->entries,
-                [name](const DictionaryEntry &e) { return strcasecmp(e.name.c_str(), name) == 0; });
+                [name](const DictionaryEntry &e) { return tvx::ascii::Equal(e.name, name); });
   return dict->entries.size() != before;
 }
 
@@ -198,13 +197,12 @@ Bool Dictionary_StringToBool(const char *text, Bool dflt) {
   while (*text == ' ' || *text == '\t') text++;
   size_t n = std::strlen(text);
   while (n > 0 && (text[n - 1] == ' ' || text[n - 1] == '\t')) n--;
-  static const char *const kTrue[] = {"true", "yes", "on", "1"};
-  static const char *const kFalse[] = {"false", "no", "off", "0"};
-  for (const char *t : kTrue) {
-    if (std::strlen(t) == n && strncasecmp(text, t, n) == 0) return TRUE;
+  std::string_view word(text, n);
+  for (const char *t : {"true", "yes", "on", "1"}) {
+    if (tvx::ascii::Equal(word, t)) return TRUE;
   }
-  for (const char *f : kFalse) {
-    if (std::strlen(f) == n && strncasecmp(text, f, n) == 0) return FALSE;
+  for (const char *f : {"false", "no", "off", "0"}) {
+    if (tvx::ascii::Equal(word, f)) return FALSE;
   }
   return dflt;
 }

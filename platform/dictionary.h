@@ -9,6 +9,7 @@
 #pragma once
 
 #include "tvx_base.h"
+#include "tvx_dictionary.h"  // the exported calls (C linkage)
 
 #include <cstddef>
 #include <cstdint>
@@ -84,3 +85,8 @@ Bool Dict_SetString(Dictionary *dict, const char *value, const char *nameFmt, ..
     TVX_PRINTF(3, 4);
 Bool Dict_SetBool(Dictionary *dict, Bool value, const char *nameFmt, ...) TVX_PRINTF(3, 4);
 Bool Dict_SetLong(Dictionary *dict, int32_t value, const char *nameFmt, ...) TVX_PRINTF(3, 4);
+
+#include "platform/unique.h"
+namespace tvx {
+TVX_MAKE_DELETER(Dictionary, Dictionary_Free);
+}  // namespace tvx

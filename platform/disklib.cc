@@ -8,8 +8,10 @@
 #include <cstring>
 #include <map>
 #include <string>
-#include <strings.h>
+#include <string_view>
 
+#include "platform/ascii.h"
+#include "platform/endian.h"
 #include "platform/fileio.h"
 #include "platform/util.h"
 
@@ -26,18 +28,6 @@ constexpr size_t kDescriptorSizeField = 36;
 constexpr uint64_t kMaxDescriptor = 1u << 20;
 constexpr char kDescriptorMagic[] = "# Disk DescriptorFile";
 
-uint64_t Le64(const unsigned char *p) {
-  uint64_t v = 0;
-  for (int i = 7; i >= 0; i--) v = (v << 8) | p[i];
-  return v;
-}
-
-std::string Lower(std::string s) {
-  for (char &c : s) {
-    if (c >= 'A' && c <= 'Z') c = static_cast<char>(c - 'A' + 'a');
-  }
-  return s;
-}
 
 // ParseDdb collects the ddb.* lines; other lines of the descriptor are of no
 // interest here and are skipped whatever they hold.
@@ -49,11 +39,11 @@ void ParseDdb(const std::string &text, std::map<std::string, std::string> *out) 
     std::string line = text.substr(pos, end - pos);
     pos = end + 1;
     size_t i = line.find_first_not_of(" \t");
-    if (i == std::string::npos || strncasecmp(line.c_str() + i, "ddb.", 4) != 0) continue;
+    if (i == std::string::npos || !tvx::ascii::StartsWith(std::string_view(line).substr(i), "ddb.")) continue;
     size_t eq = line.find('=', i);
     if (eq == std::string::npos) continue;
     size_t nameEnd = line.find_last_not_of(" \t", eq - 1);
-    std::string name = Lower(line.substr(i + 4, nameEnd + 1 - (i + 4)));
+    std::string name = tvx::ascii::Lower(line.substr(i + 4, nameEnd + 1 - (i + 4)));
     size_t v = line.find_first_not_of(" \t", eq + 1);
     std::string value;
     if (v != std::string::npos) {
@@ -78,9 +68,11 @@ DiskLibError ReadDescriptor(FileIODescriptor *fd, std::string *out) {
   if (rc != FILEIO_SUCCESS && rc != FILEIO_READ_ERROR_EOF) return DISKLIB_ERR_OPEN;
   if (got >= 4 && std::memcmp(header, "KDMV", 4) == 0) {
     if (got < kSector) return DISKLIB_ERR_FORMAT;
-    uint64_t offset = Le64(header + kDescriptorOffsetField);
-    uint64_t sectors = Le64(header + kDescriptorSizeField);
-    if (offset == 0 || sectors == 0 || sectors > kMaxDescriptor / kSector ||
+    tvx::ByteCursor fields(header, got);
+    uint64_t offset = 0, sectors = 0;
+    static_assert(kDescriptorSizeField == kDescriptorOffsetField + 8);
+    if (!fields.Skip(kDescriptorOffsetField) || !fields.GetLe64(&offset) ||
+        !fields.GetLe64(&sectors) || offset == 0 || sectors == 0 || sectors > kMaxDescriptor / kSector ||
         offset > size / kSector || sectors > size / kSector - offset) {
       return DISKLIB_ERR_FORMAT;
     }
@@ -121,7 +113,7 @@ DiskLibError DiskLib_Open(const char *path, unsigned flags, unsigned reserved,
 
 DiskLibError DiskLib_DBGet(const DiskLibHandle *handle, const char *key, char **out_value) {
   *out_value = nullptr;
-  std::string k = Lower(key);
+  std::string k = tvx::ascii::Lower(key);
   if (k.rfind("ddb.", 0) == 0) k.erase(0, 4);
   auto it = handle->ddb.find(k);
   if (it == handle->ddb.end()) return DISKLIB_ERR_NOT_FOUND;

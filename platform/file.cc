@@ -12,6 +12,8 @@
 #include <unistd.h>
 #include <vector>
 
+#include "platform/fd_io.h"
+#include "platform/unique.h"
 #include "platform/util.h"
 
 namespace {
@@ -20,27 +22,6 @@ char *Dup(const std::string &s) { return UtilSafeStrndup0(s.data(), s.size()); }
 
 void StoreOptional(char **out, const std::string &s) {
   if (out != nullptr) *out = Dup(s);
-}
-
-// Closes the descriptor on every path out of a function.
-struct Fd {
-  int fd = -1;
-  ~Fd() {
-    if (fd >= 0) ::close(fd);
-  }
-};
-
-bool WriteAll(int fd, const char *p, size_t n) {
-  while (n > 0) {
-    ssize_t w = ::write(fd, p, n);
-    if (w < 0) {
-      if (errno == EINTR) continue;
-      return false;
-    }
-    p += w;
-    n -= static_cast<size_t>(w);
-  }
-  return true;
 }
 
 bool IsMissing(const char *path) {
@@ -101,33 +82,30 @@ Bool File_IsFile(const char *path) {
 }
 
 Bool File_Copy(const char *src, const char *dst, Bool overwrite) {
-  Fd in;
-  in.fd = ::open(src, O_RDONLY | O_CLOEXEC);
+  tvx::UniqueFd in(::open(src, O_RDONLY | O_CLOEXEC));
   struct stat sst;
-  if (in.fd < 0 || fstat(in.fd, &sst) != 0 || !S_ISREG(sst.st_mode)) return FALSE;
-  Fd out;
+  if (!in || fstat(in.get(), &sst) != 0 || !S_ISREG(sst.st_mode)) return FALSE;
   bool created = IsMissing(dst);
   // No O_TRUNC yet: the target may be the source itself under another name,
   // and emptying it would lose the data being copied.
-  out.fd = ::open(dst, O_WRONLY | O_CREAT | O_CLOEXEC | (overwrite ? 0 : O_EXCL),
-                  sst.st_mode & 07777);
+  tvx::UniqueFd out(::open(dst, O_WRONLY | O_CREAT | O_CLOEXEC | (overwrite ? 0 : O_EXCL),
+                  sst.st_mode & 07777));
   struct stat dstSt;
-  if (out.fd < 0 || fstat(out.fd, &dstSt) != 0) return FALSE;
+  if (!out || fstat(out.get(), &dstSt) != 0) return FALSE;
   if (dstSt.st_dev == sst.st_dev && dstSt.st_ino == sst.st_ino) return FALSE;
-  bool ok = ftruncate(out.fd, 0) == 0;
+  bool ok = ftruncate(out.get(), 0) == 0;
   std::vector<char> buf(1 << 16);
   while (ok) {
-    ssize_t n = ::read(in.fd, buf.data(), buf.size());
+    ssize_t n = ::read(in.get(), buf.data(), buf.size());
     if (n < 0 && errno == EINTR) continue;
     if (n <= 0) {
       ok = n == 0;
       break;
     }
-    ok = WriteAll(out.fd, buf.data(), static_cast<size_t>(n));
+    ok = tvx::WriteAll(out.get(), buf.data(), static_cast<size_t>(n));
   }
-  ok = ok && fchmod(out.fd, sst.st_mode & 07777) == 0;
-  ok = ::close(out.fd) == 0 && ok;
-  out.fd = -1;
+  ok = ok && fchmod(out.get(), sst.st_mode & 07777) == 0;
+  ok = out.Close() && ok;
   // A half-written new file is worse than none.
   if (!ok && created) ::unlink(dst);
   return ok ? TRUE : FALSE;

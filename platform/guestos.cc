@@ -10,7 +10,7 @@
 // signed image map rather than from the built-in family table.
 #include "platform/guestos.h"
 
-#include <strings.h>
+#include "platform/ascii.h"
 
 namespace {
 
@@ -231,7 +231,7 @@ bool IsWinGen(GuestOSID id, WinGen gen, int server) {
 GuestOSID GuestOS_GetOSIDByName(const char *name) {
   if (name == nullptr) return GUESTOS_ID_UNKNOWN;
   for (const auto &row : kGuestOS) {
-    if (strcasecmp(row.name, name) == 0) return row.id;
+    if (tvx::ascii::Equal(row.name, name)) return row.id;
   }
   return GUESTOS_ID_UNKNOWN;
 }

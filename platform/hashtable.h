@@ -55,3 +55,8 @@ size_t HashTable_GetNumElements(const HashTable *ht);
 // callback's first non-zero result, or 0. The callback must not change the
 // table.
 int HashTable_ForEach(const HashTable *ht, HashTableForEachFn fn, void *ctx);
+
+#include "platform/unique.h"
+namespace tvx {
+TVX_MAKE_DELETER(HashTable, HashTable_Free);
+}  // namespace tvx

@@ -1,46 +1,81 @@
+// libcurl is opened with dlopen on first use: linking it costs every process
+// about 10 ms of start-up (its TLS, LDAP and Kerberos dependencies), and most
+// processes never speak HTTP. curl's headers are used for types and option
+// numbers only; every call goes through the table filled by LoadCurl().
 #include "platform/http.h"
 
+#define CURL_DISABLE_TYPECHECK 1  // the calls go through pointers, not the macros
+#include <curl/curl.h>
+
+#include <dlfcn.h>
+
 #include <cinttypes>
+#include <climits>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <memory>
 #include <mutex>
 #include <string>
-#include <strings.h>
 
-#include <curl/curl.h>
-
-#include "platform/unique.h"
-
-namespace tvx {
-TVX_MAKE_DELETER(CURL, curl_easy_cleanup);
-}  // namespace tvx
-
-struct HttpConnection {
-  tvx::UniquePtr<CURL> curl;
-  unsigned attempts = 1;
-  long timeoutMs = 30000;
-  std::string user, password;
-};
+#include "platform/ascii.h"
 
 namespace {
 
-void GlobalInit() {
-  static std::once_flag once;
-  std::call_once(once, [] { curl_global_init(CURL_GLOBAL_DEFAULT); });
+struct CurlApi {
+  decltype(&curl_global_init) global_init;
+  decltype(&curl_easy_init) easy_init;
+  decltype(&curl_easy_cleanup) easy_cleanup;
+  decltype(&curl_easy_reset) easy_reset;
+  decltype(&curl_easy_perform) easy_perform;
+  CURLcode (*easy_setopt)(CURL *, CURLoption, ...);
+  CURLcode (*easy_getinfo)(CURL *, CURLINFO, ...);
+};
+
+template <typename Fn>
+bool Resolve(void *lib, const char *name, Fn *out) {
+  *out = reinterpret_cast<Fn>(dlsym(lib, name));
+  return *out != nullptr;
 }
 
+// LoadCurl returns the loaded library's entry points, or null when it is
+// missing. The handle is never closed: libcurl keeps global state.
+const CurlApi *LoadCurl() {
+  static CurlApi api;
+  static bool ok = false;
+  static std::once_flag once;
+  std::call_once(once, [] {
+    void *lib = dlopen("libcurl.so.4", RTLD_NOW | RTLD_LOCAL);
+    if (lib == nullptr) return;
+    ok = Resolve(lib, "curl_global_init", &api.global_init) &&
+         Resolve(lib, "curl_easy_init", &api.easy_init) &&
+         Resolve(lib, "curl_easy_cleanup", &api.easy_cleanup) &&
+         Resolve(lib, "curl_easy_reset", &api.easy_reset) &&
+         Resolve(lib, "curl_easy_perform", &api.easy_perform) &&
+         Resolve(lib, "curl_easy_setopt", &api.easy_setopt) &&
+         Resolve(lib, "curl_easy_getinfo", &api.easy_getinfo) &&
+         api.global_init(CURL_GLOBAL_DEFAULT) == CURLE_OK;
+  });
+  return ok ? &api : nullptr;
+}
+
+// An error page is read (and dropped) up to this size; a larger one ends the
+// transfer.
+constexpr size_t kMaxErrorBody = 64 * 1024;
+constexpr long kMaxRedirects = 3;
+
 bool IsHttpUrl(const char *url) {
-  return url != nullptr && (strncasecmp(url, "http://", 7) == 0 || strncasecmp(url, "https://", 8) == 0);
+  return url != nullptr &&
+         (tvx::ascii::StartsWith(url, "http://") || tvx::ascii::StartsWith(url, "https://"));
 }
 
 HttpError FromCurl(CURLcode rc) {
   switch (rc) {
     case CURLE_OK: return HTTP_OK;
     case CURLE_OPERATION_TIMEDOUT: return HTTP_ERR_TIMEOUT;
+    case CURLE_COULDNT_CONNECT: return HTTP_ERR_REFUSED;
     case CURLE_COULDNT_RESOLVE_HOST:
     case CURLE_COULDNT_RESOLVE_PROXY:
-    case CURLE_COULDNT_CONNECT:
     case CURLE_SSL_CONNECT_ERROR:
     case CURLE_PEER_FAILED_VERIFICATION:
     case CURLE_RECV_ERROR:
@@ -50,12 +85,28 @@ HttpError FromCurl(CURLcode rc) {
     case CURLE_URL_MALFORMAT:
     case CURLE_UNSUPPORTED_PROTOCOL:
       return HTTP_ERR_ARGS;
-    case CURLE_PARTIAL_FILE:
-      return HTTP_ERR_SHORT;
-    default:
-      return HTTP_ERR_PROTOCOL;
+    case CURLE_TOO_MANY_REDIRECTS: return HTTP_ERR_REDIRECTS;
+    case CURLE_PARTIAL_FILE: return HTTP_ERR_SHORT;
+    default: return HTTP_ERR_PROTOCOL;
   }
 }
+
+bool Transient(HttpError e) { return e == HTTP_ERR_CONNECT || e == HTTP_ERR_TIMEOUT; }
+
+}  // namespace
+
+struct HttpConnection {
+  const CurlApi *api = nullptr;
+  CURL *curl = nullptr;
+  unsigned attempts = 1;
+  long timeoutMs = 30000;
+  std::string user, password;
+  ~HttpConnection() {
+    if (curl != nullptr) api->easy_cleanup(curl);
+  }
+};
+
+namespace {
 
 // One request's state, seen by the header and body callbacks.
 struct Transfer {
@@ -65,19 +116,19 @@ struct Transfer {
   Http_ProgressFn progress = nullptr;
   void *ctx = nullptr;
 
-  long status = 0;          // of the last status line seen
+  long status = 0;           // of the last status line seen
   bool rangeAnswer = false;  // a Content-Range header came
   bool rangeMismatch = false;
-  bool bodyStarted = false;
-  uint64_t skip = 0;         // bytes of a whole-file answer before the range
-  size_t got = 0;
+  bool noRange = false;      // a whole-file answer to a read past offset 0
+  bool overflow = false;     // more range bytes than asked for
   bool cancelled = false;
+  size_t got = 0;
+  size_t dropped = 0;        // bytes of an error page
 
   void Reset() {
     status = 0;
-    rangeAnswer = rangeMismatch = bodyStarted = cancelled = false;
-    skip = 0;
-    got = 0;
+    rangeAnswer = rangeMismatch = noRange = overflow = cancelled = false;
+    got = dropped = 0;
   }
 };
 
@@ -85,18 +136,16 @@ size_t OnHeader(char *data, size_t size, size_t n, void *user) {
   auto *t = static_cast<Transfer *>(user);
   size_t total = size * n;
   std::string line(data, total);
-  if (strncasecmp(line.c_str(), "HTTP/", 5) == 0) {
+  if (tvx::ascii::StartsWith(line, "HTTP/")) {
     // A new status line (after a redirect or "100 Continue"): start over.
-    long status = 0;
     size_t sp = line.find(' ');
-    if (sp != std::string::npos) status = std::strtol(line.c_str() + sp + 1, nullptr, 10);
-    t->status = status;
-    t->rangeAnswer = false;
-    t->rangeMismatch = false;
-  } else if (strncasecmp(line.c_str(), "Content-Range:", 14) == 0) {
-    uint64_t first = 0;
+    t->status = sp == std::string::npos ? 0 : std::strtol(line.c_str() + sp + 1, nullptr, 10);
+    t->rangeAnswer = t->rangeMismatch = false;
+  } else if (tvx::ascii::StartsWith(line, "Content-Range:")) {
+    uint64_t first = 0, last = 0;
     t->rangeAnswer = true;
-    if (std::sscanf(line.c_str() + 14, " bytes %" SCNu64 "-", &first) != 1 || first != t->offset) {
+    if (std::sscanf(line.c_str() + 14, " bytes %" SCNu64 "-%" SCNu64, &first, &last) != 2 ||
+        first != t->offset || last < first) {
       t->rangeMismatch = true;
     }
   }
@@ -106,70 +155,75 @@ size_t OnHeader(char *data, size_t size, size_t n, void *user) {
 size_t OnBody(char *data, size_t size, size_t n, void *user) {
   auto *t = static_cast<Transfer *>(user);
   size_t total = size * n;
-  if (!t->bodyStarted) {
-    t->bodyStarted = true;
-    // A server that ignores Range sends the whole file: skip to the range.
-    if (t->status == 200) t->skip = t->offset;
+  if (t->status != 200 && t->status != 206) {
+    t->dropped += total;
+    return t->dropped <= kMaxErrorBody ? total : 0;
   }
-  // Error pages and answers for another range are not data.
-  if ((t->status != 200 && t->status != 206) || t->rangeMismatch) return total;
-  size_t i = 0;
-  if (t->skip > 0) {
-    size_t s = t->skip < total ? static_cast<size_t>(t->skip) : total;
-    t->skip -= s;
-    i = s;
+  if (t->rangeMismatch) return 0;
+  if (t->status == 200 && t->offset != 0) {
+    // The whole file would have to be read through to reach the range.
+    t->noRange = true;
+    return 0;
   }
   size_t room = t->len - t->got;
-  size_t take = total - i < room ? total - i : room;
-  std::memcpy(t->buf + t->got, data + i, take);
+  size_t take = total < room ? total : room;
+  std::memcpy(t->buf + t->got, data, take);
   t->got += take;
   if (take > 0 && t->progress != nullptr && t->progress(t->got, t->len, t->ctx) != 0) {
     t->cancelled = true;
     return 0;
   }
-  // Once the range is complete the rest of a whole-file answer is not
-  // wanted: stop the transfer (reported as a write error, ignored below).
-  if (t->got == t->len && i + take < total) return 0;
+  if (take < total) {
+    // A whole-file answer at offset 0 has what was asked: stop it there. A
+    // range answer longer than the range is broken.
+    if (t->status == 206) t->overflow = true;
+    return 0;
+  }
   return total;
 }
 
 size_t Discard(char *, size_t size, size_t n, void *) { return size * n; }
 
-void Prepare(HttpConnection *conn, const char *url) {
-  CURL *c = conn->curl.get();
-  curl_easy_reset(c);
-  curl_easy_setopt(c, CURLOPT_URL, url);
-  curl_easy_setopt(c, CURLOPT_PROTOCOLS_STR, "http,https");
-  curl_easy_setopt(c, CURLOPT_REDIR_PROTOCOLS_STR, "http,https");
-  curl_easy_setopt(c, CURLOPT_FOLLOWLOCATION, 1L);
-  curl_easy_setopt(c, CURLOPT_MAXREDIRS, 5L);
-  curl_easy_setopt(c, CURLOPT_TIMEOUT_MS, conn->timeoutMs);
-  curl_easy_setopt(c, CURLOPT_CONNECTTIMEOUT_MS, conn->timeoutMs);
-  curl_easy_setopt(c, CURLOPT_NOSIGNAL, 1L);  // a library must not touch signal handlers
+void Prepare(HttpConnection *conn, const char *url, long totalMs) {
+  const CurlApi &a = *conn->api;
+  CURL *c = conn->curl;
+  a.easy_reset(c);
+  a.easy_setopt(c, CURLOPT_URL, url);
+  a.easy_setopt(c, CURLOPT_PROTOCOLS_STR, "http,https");
+  a.easy_setopt(c, CURLOPT_REDIR_PROTOCOLS_STR, "http,https");
+  a.easy_setopt(c, CURLOPT_FOLLOWLOCATION, 1L);
+  a.easy_setopt(c, CURLOPT_MAXREDIRS, kMaxRedirects);
+  a.easy_setopt(c, CURLOPT_CONNECTTIMEOUT_MS, conn->timeoutMs);
+  a.easy_setopt(c, CURLOPT_TIMEOUT_MS, totalMs);
+  // A transfer that stalls for the timeout ends even when the total budget
+  // of a large read is far away.
+  a.easy_setopt(c, CURLOPT_LOW_SPEED_LIMIT, 1L);
+  a.easy_setopt(c, CURLOPT_LOW_SPEED_TIME, conn->timeoutMs < 1000 ? 1L : conn->timeoutMs / 1000);
+  a.easy_setopt(c, CURLOPT_NOSIGNAL, 1L);  // a library must not touch signal handlers
   if (!conn->user.empty()) {
-    curl_easy_setopt(c, CURLOPT_USERNAME, conn->user.c_str());
-    curl_easy_setopt(c, CURLOPT_PASSWORD, conn->password.c_str());
+    a.easy_setopt(c, CURLOPT_USERNAME, conn->user.c_str());
+    a.easy_setopt(c, CURLOPT_PASSWORD, conn->password.c_str());
   }
 }
 
-// Perform runs the prepared request, trying again while the connection
-// itself fails; *out_status receives the final HTTP status.
+// Perform runs the prepared request, trying again while it times out or the
+// connection drops; *out_status receives the final HTTP status.
 CURLcode Perform(HttpConnection *conn, long *out_status, Transfer *t) {
   CURLcode rc = CURLE_OK;
   for (unsigned attempt = 0; attempt < conn->attempts; attempt++) {
     if (t != nullptr) t->Reset();
-    rc = curl_easy_perform(conn->curl.get());
-    HttpError e = FromCurl(rc);
-    if (e != HTTP_ERR_CONNECT && e != HTTP_ERR_TIMEOUT) break;
+    rc = conn->api->easy_perform(conn->curl);
+    if (!Transient(FromCurl(rc))) break;
   }
   *out_status = 0;
-  curl_easy_getinfo(conn->curl.get(), CURLINFO_RESPONSE_CODE, out_status);
+  conn->api->easy_getinfo(conn->curl, CURLINFO_RESPONSE_CODE, out_status);
   return rc;
 }
 
 HttpError FromStatus(long status, long wanted) {
   if (status == wanted) return HTTP_OK;
   if (status == 404 || status == 410) return HTTP_ERR_NOT_FOUND;
+  if (status >= 300 && status < 400) return HTTP_ERR_REDIRECTS;  // a redirect not followed
   return HTTP_ERR_STATUS;
 }
 
@@ -179,10 +233,12 @@ HttpError Http_Connect(const char *url, unsigned attempts, unsigned timeoutMs, u
                        const char *user, const char *password, HttpConnection **out_conn) {
   *out_conn = nullptr;
   if (!IsHttpUrl(url)) return HTTP_ERR_ARGS;
-  GlobalInit();
+  const CurlApi *api = LoadCurl();
+  if (api == nullptr) return HTTP_ERR_NO_CLIENT;
   auto conn = std::make_unique<HttpConnection>();
-  conn->curl.reset(curl_easy_init());
-  if (!conn->curl) return HTTP_ERR_CONNECT;
+  conn->api = api;
+  conn->curl = api->easy_init();
+  if (conn->curl == nullptr) return HTTP_ERR_NO_CLIENT;
   conn->attempts = attempts == 0 ? 1 : attempts;
   conn->timeoutMs = timeoutMs == 0 ? 30000 : static_cast<long>(timeoutMs);
   if (user != nullptr) conn->user = user;
@@ -194,16 +250,17 @@ HttpError Http_Connect(const char *url, unsigned attempts, unsigned timeoutMs, u
 HttpError Http_GetFileSize(HttpConnection *conn, const char *url, uint64_t *out_size) {
   *out_size = 0;
   if (conn == nullptr || !IsHttpUrl(url)) return HTTP_ERR_ARGS;
-  Prepare(conn, url);
-  curl_easy_setopt(conn->curl.get(), CURLOPT_NOBODY, 1L);
-  curl_easy_setopt(conn->curl.get(), CURLOPT_WRITEFUNCTION, Discard);
+  Prepare(conn, url, conn->timeoutMs);
+  const CurlApi &a = *conn->api;
+  a.easy_setopt(conn->curl, CURLOPT_NOBODY, 1L);
+  a.easy_setopt(conn->curl, CURLOPT_WRITEFUNCTION, Discard);
   long status = 0;
   CURLcode rc = Perform(conn, &status, nullptr);
   if (rc != CURLE_OK) return FromCurl(rc);
   HttpError e = FromStatus(status, 200);
   if (e != HTTP_OK) return e;
   curl_off_t length = -1;
-  if (curl_easy_getinfo(conn->curl.get(), CURLINFO_CONTENT_LENGTH_DOWNLOAD_T, &length) != CURLE_OK ||
+  if (a.easy_getinfo(conn->curl, CURLINFO_CONTENT_LENGTH_DOWNLOAD_T, &length) != CURLE_OK ||
       length < 0) {
     return HTTP_ERR_SHORT;
   }
@@ -222,25 +279,28 @@ HttpError Http_Read(HttpConnection *conn, const char *url, uint64_t offset, void
   t.offset = offset;
   t.progress = progress;
   t.ctx = ctx;
-  Prepare(conn, url);
+  // The total budget grows with the size asked for (at least 256 KiB/s);
+  // stalls are caught sooner by the low-speed limit.
+  uint64_t budget = static_cast<uint64_t>(conn->timeoutMs) + len / 256;
+  Prepare(conn, url, budget > LONG_MAX ? LONG_MAX : static_cast<long>(budget));
   char range[64];
   std::snprintf(range, sizeof range, "%" PRIu64 "-%" PRIu64, offset, offset + len - 1);
-  CURL *c = conn->curl.get();
-  curl_easy_setopt(c, CURLOPT_RANGE, range);
-  curl_easy_setopt(c, CURLOPT_HEADERFUNCTION, OnHeader);
-  curl_easy_setopt(c, CURLOPT_HEADERDATA, &t);
-  curl_easy_setopt(c, CURLOPT_WRITEFUNCTION, OnBody);
-  curl_easy_setopt(c, CURLOPT_WRITEDATA, &t);
+  const CurlApi &a = *conn->api;
+  a.easy_setopt(conn->curl, CURLOPT_RANGE, range);
+  a.easy_setopt(conn->curl, CURLOPT_HEADERFUNCTION, OnHeader);
+  a.easy_setopt(conn->curl, CURLOPT_HEADERDATA, &t);
+  a.easy_setopt(conn->curl, CURLOPT_WRITEFUNCTION, OnBody);
+  a.easy_setopt(conn->curl, CURLOPT_WRITEDATA, &t);
   long status = 0;
   CURLcode rc = Perform(conn, &status, &t);
   if (t.cancelled) return HTTP_ERR_STATUS;
+  if (t.noRange) return HTTP_ERR_NO_RANGE;
+  if (t.overflow || (status == 206 && (!t.rangeAnswer || t.rangeMismatch))) return HTTP_ERR_PROTOCOL;
+  if (status != 200 && status != 206 && status != 0) return FromStatus(status, 206);
   bool filled = t.got == t.len;
+  // A whole-file answer stopped once the range was filled ends in a write
+  // error; that is success.
   if (rc != CURLE_OK && !(rc == CURLE_WRITE_ERROR && filled)) return FromCurl(rc);
-  if (status == 206) {
-    if (!t.rangeAnswer || t.rangeMismatch) return HTTP_ERR_PROTOCOL;
-  } else if (status != 200) {
-    return FromStatus(status, 206);
-  }
   return filled ? HTTP_OK : HTTP_ERR_SHORT;
 }
 
@@ -253,12 +313,16 @@ const char *Http_ErrorString(HttpError error) {
   switch (error) {
     case HTTP_OK: return "success";
     case HTTP_ERR_ARGS: return "invalid URL or arguments";
-    case HTTP_ERR_CONNECT: return "cannot connect to the server";
+    case HTTP_ERR_CONNECT: return "cannot reach the server";
     case HTTP_ERR_TIMEOUT: return "the server did not answer in time";
     case HTTP_ERR_NOT_FOUND: return "the file was not found on the server";
     case HTTP_ERR_STATUS: return "unexpected answer from the server";
-    case HTTP_ERR_SHORT: return "the server sent less data than asked for";
+    case HTTP_ERR_SHORT: return "the server sent less data than promised";
     case HTTP_ERR_PROTOCOL: return "malformed answer from the server";
+    case HTTP_ERR_REFUSED: return "connection refused";
+    case HTTP_ERR_NO_RANGE: return "the server does not serve byte ranges";
+    case HTTP_ERR_REDIRECTS: return "too many redirects";
+    case HTTP_ERR_NO_CLIENT: return "the HTTP client library (libcurl.so.4) cannot be loaded";
   }
   return "unknown error";
 }

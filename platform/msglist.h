@@ -24,3 +24,8 @@ void MsgList_Log(const MsgList *list);
 Bool MsgList_IsEmpty(const MsgList *list);
 // MsgList_Free releases the list; null is harmless.
 void MsgList_Free(MsgList *list);
+
+#include "platform/unique.h"
+namespace tvx {
+TVX_MAKE_DELETER(MsgList, MsgList_Free);
+}  // namespace tvx

@@ -4,10 +4,11 @@
 #include <cstring>
 #include <regex>
 #include <string>
-#include <strings.h>
 #include <vector>
 
+#include "platform/ascii.h"
 #include "platform/file.h"
+#include "platform/unique.h"
 #include "platform/util.h"
 
 namespace {
@@ -19,15 +20,14 @@ struct Collect {
 bool IsDiskDevice(const Dictionary *config, const std::string &device, const std::string &bus) {
   if (!Dict_GetBool(config, FALSE, "%s.present", device.c_str())) return false;
   if (!Dict_GetBool(config, TRUE, "%s.present", bus.c_str())) return false;
-  char *type = Dict_GetString(config, "", "%s.deviceType", device.c_str());
-  bool removable = strcasestr(type, "cdrom") != nullptr || strcasestr(type, "floppy") != nullptr;
-  std::free(type);
-  if (removable) return false;
-  char *file = Dict_GetString(config, "", "%s.fileName", device.c_str());
-  size_t n = std::strlen(file);
-  bool vmdk = n > 5 && strcasecmp(file + n - 5, ".vmdk") == 0;
-  std::free(file);
-  return vmdk;
+  tvx::CharPtr typeText(Dict_GetString(config, "", "%s.deviceType", device.c_str()));
+  std::string type = tvx::ascii::Lower(typeText.get());
+  if (type.find("cdrom") != std::string::npos || type.find("floppy") != std::string::npos) {
+    return false;
+  }
+  tvx::CharPtr file(Dict_GetString(config, "", "%s.fileName", device.c_str()));
+  std::string_view name(file.get());
+  return name.size() > 5 && tvx::ascii::EndsWith(name, ".vmdk");
 }
 
 void Push(SnapshotStringList ***tail, const std::string &text) {
@@ -57,15 +57,16 @@ SnapshotError Snapshot_GetCurrentDisksCfgDict(const char *configPath, const Dict
           auto *c = static_cast<Collect *>(ctx);
           std::string device(name, static_cast<size_t>(m.length(0)) - std::strlen(".fileName"));
           bool seen = false;
-          for (const auto &d : c->devices) seen = seen || strcasecmp(d.c_str(), device.c_str()) == 0;
+          for (const auto &d : c->devices) seen = seen || tvx::ascii::Equal(d, device);
           if (!seen) c->devices.push_back(device);
         }
         return TRUE;
       },
       &found);
 
-  char *dir = nullptr;
-  File_GetPathName(configPath, &dir, nullptr);
+  char *dirText = nullptr;
+  File_GetPathName(configPath, &dirText, nullptr);
+  tvx::CharPtr dir(dirText);
   SnapshotStringList **devTail = out_devices, **diskTail = out_disks;
   SnapshotStringList *devScratch = nullptr, *diskScratch = nullptr;
   if (devTail == nullptr) devTail = &devScratch;
@@ -73,18 +74,13 @@ SnapshotError Snapshot_GetCurrentDisksCfgDict(const char *configPath, const Dict
   for (const auto &device : found.devices) {
     std::string bus = device.substr(0, device.find(':'));
     if (!IsDiskDevice(config, device, bus)) continue;
-    char *file = Dict_GetString(config, "", "%s.fileName", device.c_str());
-    std::string path = file;
-    std::free(file);
-    if (path[0] != '/' && dir[0] != '\0') {
-      char *joined = File_PathJoin(dir, path.c_str());
-      path = joined;
-      std::free(joined);
+    std::string path = tvx::CharPtr(Dict_GetString(config, "", "%s.fileName", device.c_str())).get();
+    if (path[0] != '/' && dir.get()[0] != '\0') {
+      path = tvx::CharPtr(File_PathJoin(dir.get(), path.c_str())).get();
     }
     Push(&devTail, device);
     Push(&diskTail, path);
   }
-  std::free(dir);
   Snapshot_FreeStringList(devScratch);
   Snapshot_FreeStringList(diskScratch);
   return SNAPSHOT_OK;

@@ -1,11 +1,12 @@
 #include "platform/str.h"
 
-#include <cctype>
+#include <string_view>
 #include <climits>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
 
+#include "platform/ascii.h"
 #include "platform/log.h"
 
 // Formatting goes through the caller's format text by design; the callers'
@@ -85,16 +86,12 @@ char *Str_Strcat(char *dst, const char *src, size_t size) {
 }
 
 char *Str_ToUpper(char *s) {
-  for (char *p = s; *p != '\0'; p++) {
-    if (*p >= 'a' && *p <= 'z') *p = static_cast<char>(*p - 'a' + 'A');
-  }
+  for (char *p = s; *p != '\0'; p++) *p = tvx::ascii::ToUpper(*p);
   return s;
 }
 
 char *Str_ToLower(char *s) {
-  for (char *p = s; *p != '\0'; p++) {
-    if (*p >= 'A' && *p <= 'Z') *p = static_cast<char>(*p - 'A' + 'a');
-  }
+  for (char *p = s; *p != '\0'; p++) *p = tvx::ascii::ToLower(*p);
   return s;
 }
 
@@ -139,8 +136,8 @@ bool ParseWhole(const char *s, bool allowSign, long long lo, long long hi, long 
     int d;
     if (*s >= '0' && *s <= '9') {
       d = *s - '0';
-    } else if (base == 16 && std::isxdigit(static_cast<unsigned char>(*s))) {
-      d = std::tolower(static_cast<unsigned char>(*s)) - 'a' + 10;
+    } else if (base == 16 && tvx::ascii::IsXDigit(*s)) {
+      d = tvx::ascii::ToLower(*s) - 'a' + 10;
     } else {
       return false;
     }
@@ -180,12 +177,11 @@ Bool StrUtil_EndsWith(const char *s, const char *suffix) {
 }
 
 Bool StrUtil_CaselessStartsWith(const char *s, const char *prefix) {
-  return strncasecmp(s, prefix, std::strlen(prefix)) == 0;
+  return tvx::ascii::StartsWith(s, prefix);
 }
 
 Bool StrUtil_CaselessEndsWith(const char *s, const char *suffix) {
-  size_t n = std::strlen(s), m = std::strlen(suffix);
-  return m <= n && strcasecmp(s + n - m, suffix) == 0;
+  return tvx::ascii::EndsWith(s, suffix);
 }
 
 Bool StrUtil_DecimalStrToUint(unsigned int *out, const char **str) {

@@ -10,6 +10,7 @@
 #include "command.h"
 #include "floppy_cli.h"
 #include "json.h"
+#include "tools_common.h"
 #include "tvx_fat.h"
 #include "tvx_floppy.h"
 

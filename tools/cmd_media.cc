@@ -1,11 +1,11 @@
 // tvxguest media: look inside an install image the way recognition opens it
 // (UDF first, then ISO 9660), or with --iso9660 through the ISO 9660 reader
-// only.
+// only. Listings and extraction are the library's own tree walks, which
+// refuse loops, shared directories and data larger than the image.
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include <algorithm>
 #include <cerrno>
 #include <cstdio>
 #include <cstdlib>
@@ -30,21 +30,19 @@ constexpr const char *kUsage =
     "UDF volume, else as ISO 9660 with the richest names it carries (Rock Ridge,\n"
     "then Joliet, then plain), as recognition opens it.\n\n"
     "  ls       list DIR (default the root): size and name, directories end in \"/\";\n"
-    "           the first line names the reader and the volume identifier\n"
+    "           the first line names the reader and the volume identifier; control\n"
+    "           characters in names are shown as \\xNN\n"
     "  cat      write the file PATH to standard output\n"
-    "  extract  copy the file PATH, or the contents of the directory PATH, into DESTDIR\n\n"
+    "  extract  copy the file PATH, or the contents of the directory PATH, into DESTDIR;\n"
+    "           an image that would write outside DESTDIR, repeats a name or loops\n"
+    "           writes nothing\n\n"
     "Options:\n"
     "  -R         list subdirectories recursively\n"
     "  --json     print the listing as one JSON object\n"
     "  --iso9660  use the ISO 9660 reader even when the image holds UDF\n"
     "  -h, --help show this help\n\n"
-    "Exit status: 0 success, 1 no such path or a read failed, 2 the image cannot be\n"
-    "opened, 64 usage error.\n";
-
-// A recursive listing stops here: a hostile image could otherwise make it run
-// for ever through shared subdirectories.
-constexpr size_t kMaxDepth = 128;
-constexpr size_t kMaxEntries = 1000000;
+    "Exit status: 0 success, 1 no such path, a read or a write failed, 2 the image\n"
+    "cannot be opened, 64 usage error.\n";
 
 struct Entry {
   std::string path;
@@ -52,19 +50,8 @@ struct Entry {
   uint64_t size = 0;
 };
 
-class Medium {
- public:
-  virtual ~Medium() = default;
-  virtual std::string ReaderName() const = 0;
-  virtual std::string VolumeId() = 0;
-  // List appends the entries of `dir` with paths prefixed by `prefix`;
-  // returns an error text or "".
-  virtual std::string List(const std::string &dir, std::vector<Entry> *out) = 0;
-  virtual std::string Cat(const std::string &path, FILE *out) = 0;
-  virtual std::string Extract(const std::string &path, const std::string &dest) = 0;
-};
-
-std::string IsoError(int rc) {
+// Both readers share one set of result numbers for their tree calls.
+std::string TreeError(int rc) {
   switch (rc) {
     case ISO9660_ERR_ARGUMENT: return "invalid argument";
     case ISO9660_ERR_IO: return "read or write failed";
@@ -78,9 +65,31 @@ std::string IsoError(int rc) {
   }
 }
 
+Bool Collect(void *ctx, const char *relPath, Bool isDirectory, uint64_t size) {
+  static_cast<std::vector<Entry> *>(ctx)->push_back({relPath, isDirectory != 0, size});
+  return TRUE;
+}
+
+class Medium {
+ public:
+  virtual ~Medium() = default;
+  virtual std::string ReaderName() const = 0;
+  virtual std::string VolumeId() = 0;
+  // Each returns an error text, or "" on success.
+  virtual std::string List(const std::string &dir, bool recursive, std::vector<Entry> *out) = 0;
+  virtual std::string Cat(const std::string &path, FILE *out) = 0;
+  virtual std::string Extract(const std::string &path, const std::string &dest) = 0;
+};
+
+std::string TakeText(char *text) {
+  std::string s = text != nullptr ? text : "";
+  std::free(text);
+  return s;
+}
+
 class IsoMedium final : public Medium {
  public:
-  explicit IsoMedium(Iso9660Image *image, uint32_t formats) : image_(image), formats_(formats) {}
+  IsoMedium(Iso9660Image *image, uint32_t formats) : image_(image), formats_(formats) {}
   ~IsoMedium() override { Iso9660_Close(image_); }
 
   std::string ReaderName() const override {
@@ -88,22 +97,10 @@ class IsoMedium final : public Medium {
     if (formats_ & ISO9660_FORMAT_JOLIET) return "iso9660 (joliet)";
     return "iso9660";
   }
-  std::string VolumeId() override {
-    char *id = Iso9660_GetVolumeId(image_);
-    std::string s = id != nullptr ? id : "";
-    std::free(id);
-    return s;
-  }
-  std::string List(const std::string &dir, std::vector<Entry> *out) override {
-    Iso9660Dir *d = nullptr;
-    int rc = Iso9660_OpenDir(image_, dir.c_str(), &d);
-    if (rc != ISO9660_OK) return IsoError(rc);
-    Iso9660DirEntry e;
-    while ((rc = Iso9660_ReadDir(image_, d, &e)) == ISO9660_OK) {
-      out->push_back({e.name, e.isDirectory != 0, e.size64});
-    }
-    Iso9660_CloseDir(image_, d);
-    return rc == ISO9660_END ? "" : IsoError(rc);
+  std::string VolumeId() override { return TakeText(Iso9660_GetVolumeId(image_)); }
+  std::string List(const std::string &dir, bool recursive, std::vector<Entry> *out) override {
+    int rc = Iso9660_ListTree(image_, dir.c_str(), recursive, Collect, out);
+    return rc == ISO9660_OK ? "" : TreeError(rc);
   }
   std::string Cat(const std::string &path, FILE *out) override {
     // A record holding only a name opens that path from the root.
@@ -112,7 +109,7 @@ class IsoMedium final : public Medium {
     std::memcpy(e.name, path.data(), path.size());
     Iso9660File *f = nullptr;
     int rc = Iso9660_OpenFile(image_, &e, &f);
-    if (rc != ISO9660_OK) return IsoError(rc);
+    if (rc != ISO9660_OK) return TreeError(rc);
     std::vector<char> buf(64 * 1024);
     std::string err;
     for (;;) {
@@ -120,7 +117,7 @@ class IsoMedium final : public Medium {
       rc = Iso9660_ReadFile(image_, f, buf.data(), &n);
       if (rc == ISO9660_END) break;
       if (rc != ISO9660_OK) {
-        err = IsoError(rc);
+        err = TreeError(rc);
         break;
       }
       if (std::fwrite(buf.data(), 1, n, out) != n) {
@@ -133,7 +130,7 @@ class IsoMedium final : public Medium {
   }
   std::string Extract(const std::string &path, const std::string &dest) override {
     int rc = Iso9660_Extract(image_, path.c_str(), dest.c_str());
-    return rc == ISO9660_OK ? "" : IsoError(rc);
+    return rc == ISO9660_OK ? "" : TreeError(rc);
   }
 
  private:
@@ -141,57 +138,18 @@ class IsoMedium final : public Medium {
   uint32_t formats_;
 };
 
-// The UDF reader has no extraction of its own: files are copied here, with
-// the same refusals as the ISO 9660 reader's (names that would leave the
-// destination, symbolic links below it).
-bool SafeName(const std::string &name) {
-  return !name.empty() && name != "." && name != ".." && name.find('/') == std::string::npos;
-}
-
 class UdfMedium final : public Medium {
  public:
   explicit UdfMedium(UDFVolume *volume) : volume_(volume) {}
   ~UdfMedium() override { UDF_Close(volume_); }
 
   std::string ReaderName() const override { return "udf"; }
-  std::string VolumeId() override {
-    char *id = UDF_GetVolumeId(volume_);
-    std::string s = id != nullptr ? id : "";
-    std::free(id);
-    return s;
-  }
-  std::string List(const std::string &dir, std::vector<Entry> *out) override {
-    UDFDir *d = UDF_OpenDir(volume_, nullptr, dir.c_str());
-    if (d == nullptr) return "no such directory";
-    while (const char *name = UDF_ReadDir(d, 0)) {
-      out->push_back({name, UDF_DirEntryIsDir(d) != 0, UDF_DirEntrySize(d)});
-    }
-    UDF_CloseDir(d);
-    return "";
+  std::string VolumeId() override { return TakeText(UDF_GetVolumeId(volume_)); }
+  std::string List(const std::string &dir, bool recursive, std::vector<Entry> *out) override {
+    int rc = UDF_ListTree(volume_, dir.c_str(), recursive, Collect, out);
+    return rc == UDF_TREE_OK ? "" : TreeError(rc);
   }
   std::string Cat(const std::string &path, FILE *out) override {
-    return Copy(path, [out](const char *buf, size_t n) { return std::fwrite(buf, 1, n, out) == n; });
-  }
-  std::string Extract(const std::string &path, const std::string &dest) override {
-    std::string err = MakeDirs(dest);
-    if (!err.empty()) return err;
-    int fd = ::open(dest.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
-    if (fd < 0) return dest + ": " + std::strerror(errno);
-    UDFDir *d = UDF_OpenDir(volume_, nullptr, path.c_str());
-    if (d != nullptr) {
-      UDF_CloseDir(d);
-      err = ExtractDir(path, fd, 0);
-    } else {
-      size_t slash = path.find_last_of('/');
-      err = ExtractFile(path, fd, slash == std::string::npos ? path : path.substr(slash + 1));
-    }
-    ::close(fd);
-    return err;
-  }
-
- private:
-  template <typename Sink>
-  std::string Copy(const std::string &path, Sink sink) {
     UDFFile *f = UDF_OpenFile(volume_, nullptr, path.c_str());
     if (f == nullptr) return "no such file";
     uint64_t size = UDF_GetFileSize(volume_, f);
@@ -201,7 +159,7 @@ class UdfMedium final : public Medium {
       size_t n = static_cast<size_t>(std::min<uint64_t>(buf.size(), size - off));
       if (!UDF_PReadFile(f, buf.data(), off, n)) {
         err = "read failed";
-      } else if (!sink(buf.data(), n)) {
+      } else if (std::fwrite(buf.data(), 1, n, out) != n) {
         err = std::strerror(errno);
       }
       off += n;
@@ -209,106 +167,86 @@ class UdfMedium final : public Medium {
     UDF_CloseFile(f);
     return err;
   }
-  static std::string MakeDirs(const std::string &path) {
-    for (size_t i = 1; i <= path.size(); ++i) {
-      if (i < path.size() && path[i] != '/') continue;
-      std::string part = path.substr(0, i);
-      if (::mkdir(part.c_str(), 0755) != 0 && errno != EEXIST) return part + ": " + std::strerror(errno);
-    }
-    return "";
-  }
-  std::string ExtractFile(const std::string &path, int dirFd, const std::string &name) {
-    if (!SafeName(name)) return "unsafe name \"" + name + "\"";
-    int fd = ::openat(dirFd, name.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_NOFOLLOW | O_CLOEXEC, 0644);
-    if (fd < 0) return name + ": " + std::strerror(errno);
-    std::string err = Copy(path, [fd](const char *buf, size_t n) {
-      for (size_t done = 0; done < n;) {
-        ssize_t w = ::write(fd, buf + done, n - done);
-        if (w < 0 && errno == EINTR) continue;
-        if (w <= 0) return false;
-        done += static_cast<size_t>(w);
-      }
-      return true;
-    });
-    if (::close(fd) != 0 && err.empty()) err = std::strerror(errno);
-    return err.empty() ? "" : path + ": " + err;
-  }
-  std::string ExtractDir(const std::string &path, int dirFd, size_t depth) {
-    if (depth >= kMaxDepth) return path + ": directories nested too deep";
-    std::vector<Entry> entries;
-    std::string err = List(path, &entries);
-    if (!err.empty()) return path + ": " + err;
-    for (const Entry &e : entries) {
-      if (!SafeName(e.path)) return "unsafe name \"" + e.path + "\"";
-    }
-    for (const Entry &e : entries) {
-      std::string inImage = path.empty() || path == "/" ? e.path : path + "/" + e.path;
-      if (!e.isDir) {
-        err = ExtractFile(inImage, dirFd, e.path);
-      } else if (::mkdirat(dirFd, e.path.c_str(), 0755) != 0 && errno != EEXIST) {
-        err = inImage + ": " + std::strerror(errno);
-      } else {
-        int sub = ::openat(dirFd, e.path.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC);
-        if (sub < 0) return inImage + ": " + std::strerror(errno);
-        err = ExtractDir(inImage, sub, depth + 1);
-        ::close(sub);
-      }
-      if (!err.empty()) return err;
-    }
-    return "";
+  std::string Extract(const std::string &path, const std::string &dest) override {
+    int rc = UDF_Extract(volume_, path.c_str(), dest.c_str());
+    return rc == UDF_TREE_OK ? "" : TreeError(rc);
   }
 
+ private:
   UDFVolume *volume_;
 };
 
-std::unique_ptr<Medium> OpenIso(const std::string &path, std::string *err) {
+// CheckImage says why `path` cannot be an image before the readers try, in
+// the words of the system ("No such file or directory"); a FIFO is refused
+// without waiting for a writer.
+std::string CheckImage(const std::string &path) {
+  int fd = ::open(path.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+  if (fd < 0) return std::strerror(errno);
+  struct stat st {};
+  bool ok = ::fstat(fd, &st) == 0 && (S_ISREG(st.st_mode) || S_ISBLK(st.st_mode));
+  ::close(fd);
+  return ok ? "" : "not a regular file or block device";
+}
+
+std::unique_ptr<Medium> OpenMedium(const std::string &path, bool isoOnly, std::string *err) {
+  *err = CheckImage(path);
+  if (!err->empty()) return nullptr;
+  if (!isoOnly) {
+    if (UDFVolume *volume = UDF_Open(path.c_str())) return std::make_unique<UdfMedium>(volume);
+  }
   uint32_t formats = 0;
   Iso9660_ListFormats(path.c_str(), &formats);
   Iso9660Image *image = nullptr;
   int rc = Iso9660_Open(path.c_str(), formats, &image);
   if (rc != ISO9660_OK) {
-    *err = IsoError(rc);
+    *err = TreeError(rc);
     return nullptr;
   }
-  uint32_t used = formats & ISO9660_FORMAT_ROCKRIDGE   ? ISO9660_FORMAT_ROCKRIDGE
-                  : formats & ISO9660_FORMAT_JOLIET ? ISO9660_FORMAT_JOLIET
-                                                    : ISO9660_FORMAT_PLAIN;
+  uint32_t used = formats & ISO9660_FORMAT_ROCKRIDGE ? ISO9660_FORMAT_ROCKRIDGE
+                  : formats & ISO9660_FORMAT_JOLIET  ? ISO9660_FORMAT_JOLIET
+                                                     : ISO9660_FORMAT_PLAIN;
   return std::make_unique<IsoMedium>(image, used);
 }
 
-std::unique_ptr<Medium> OpenMedium(const std::string &path, bool isoOnly, std::string *err) {
-  if (!isoOnly) {
-    if (UDFVolume *volume = UDF_Open(path.c_str())) return std::make_unique<UdfMedium>(volume);
-  }
-  return OpenIso(path, err);
-}
-
-std::string JoinPath(const std::string &dir, const std::string &name) {
-  if (dir.empty() || dir == "/") return name;
-  return dir.back() == '/' ? dir + name : dir + "/" + name;
-}
-
-std::string Walk(Medium &m, const std::string &dir, const std::string &shown, size_t depth,
-                 bool recursive, std::vector<Entry> *out) {
-  std::vector<Entry> here;
-  std::string err = m.List(dir, &here);
-  if (!err.empty()) return dir + ": " + err;
-  for (Entry &e : here) {
-    if (out->size() >= kMaxEntries) return "too many entries";
-    std::string inImage = JoinPath(dir, e.path);
-    e.path = shown.empty() ? e.path : shown + "/" + e.path;
-    out->push_back(e);
-    if (recursive && e.isDir) {
-      if (depth >= kMaxDepth) return inImage + ": directories nested too deep";
-      err = Walk(m, inImage, e.path, depth + 1, recursive, out);
-      if (!err.empty()) return err;
+// Shown writes a name for a terminal: control characters (C0, DEL, C1),
+// bytes that are not UTF-8 and the backslash itself become \xNN escapes, so
+// a crafted name can neither fake a listing line nor steer the terminal.
+std::string Shown(const std::string &name) {
+  std::string out;
+  auto escape = [&out](unsigned char c) {
+    char buf[5];
+    std::snprintf(buf, sizeof buf, "\\x%02x", c);
+    out += buf;
+  };
+  for (size_t i = 0; i < name.size();) {
+    auto c = static_cast<unsigned char>(name[i]);
+    size_t n = c < 0x80 ? 1 : (c & 0xE0) == 0xC0 ? 2 : (c & 0xF0) == 0xE0 ? 3 : (c & 0xF8) == 0xF0 ? 4 : 0;
+    bool valid = n != 0 && i + n <= name.size();
+    for (size_t k = 1; valid && k < n; ++k) valid = (name[i + k] & 0xC0) == 0x80;
+    bool control = c < 0x20 || c == 0x7F || c == '\\' ||
+                   (c == 0xC2 && n == 2 && valid && static_cast<unsigned char>(name[i + 1]) < 0xA0);
+    if (!valid || control) {
+      for (size_t k = 0; k < (valid ? n : 1); ++k) escape(static_cast<unsigned char>(name[i + k]));
+      i += valid ? n : 1;
+    } else {
+      out.append(name, i, n);
+      i += n;
     }
   }
-  return "";
+  return out;
 }
 
 int Fail(const std::string &what, const std::string &err, int status) {
-  std::fprintf(stderr, "tvxguest media: %s: %s\n", what.c_str(), err.c_str());
+  std::fprintf(stderr, "tvxguest media: %s: %s\n", Shown(what).c_str(), err.c_str());
+  return status;
+}
+
+// Finish reports a write failure on standard output (a full disk, a closed
+// pipe) instead of exiting 0 with the output cut short.
+int Finish(int status) {
+  if (std::fflush(stdout) != 0 || std::ferror(stdout)) {
+    return Fail("standard output", std::strerror(errno != 0 ? errno : EIO), 1);
+  }
   return status;
 }
 
@@ -348,8 +286,9 @@ int RunMedia(const std::vector<std::string> &args) {
   if (m == nullptr) return Fail(pos[0], err, 2);
 
   if (sub == "cat") {
+    errno = 0;
     err = m->Cat(pos[1], stdout);
-    return err.empty() ? 0 : Fail(pos[1], err, 1);
+    return Finish(err.empty() ? 0 : Fail(pos[1], err, 1));
   }
   if (sub == "extract") {
     err = m->Extract(pos[1], pos[2]);
@@ -357,7 +296,8 @@ int RunMedia(const std::vector<std::string> &args) {
   }
   std::string dir = pos.size() > 1 ? pos[1] : "/";
   std::vector<Entry> entries;
-  err = Walk(*m, dir, "", 0, recursive, &entries);
+  err = m->List(dir, recursive, &entries);
+  errno = 0;
   if (json) {
     std::string list = "[";
     for (size_t i = 0; i < entries.size(); ++i) {
@@ -372,16 +312,16 @@ int RunMedia(const std::vector<std::string> &args) {
     if (!err.empty()) top.Str("error", err);
     std::printf("%s\n", top.Text().c_str());
   } else {
-    std::printf("%s volume \"%s\"\n", m->ReaderName().c_str(), m->VolumeId().c_str());
+    std::printf("%s volume \"%s\"\n", m->ReaderName().c_str(), Shown(m->VolumeId()).c_str());
     for (const Entry &e : entries) {
       if (e.isDir) {
-        std::printf("%12s  %s/\n", "-", e.path.c_str());
+        std::printf("%12s  %s/\n", "-", Shown(e.path).c_str());
       } else {
-        std::printf("%12llu  %s\n", static_cast<unsigned long long>(e.size), e.path.c_str());
+        std::printf("%12llu  %s\n", static_cast<unsigned long long>(e.size), Shown(e.path).c_str());
       }
     }
   }
-  return err.empty() ? 0 : Fail(dir, err, 1);
+  return Finish(err.empty() ? 0 : Fail(dir, err, 1));
 }
 
 const CommandRegistration kMedia({"media", "list, read or extract files of a UDF or ISO 9660 image",

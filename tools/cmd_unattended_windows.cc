@@ -2,9 +2,10 @@
 // its answer files. It joins the `unattended` command group, and is left out
 // of a tool built without that group.
 #if __has_include("command_group.h") && __has_include("unattended_common.h")
+#include <algorithm>
 #include <cstdio>
+#include <cstring>
 #include <cstdlib>
-#include <filesystem>
 #include <fstream>
 #include <string>
 #include <utility>
@@ -18,6 +19,7 @@
 #include "tvx_log.h"
 #include "command_group.h"
 #include "floppy_cli.h"
+#include "staged_output.h"
 #include "unattended_common.h"
 
 namespace tvxcli {
@@ -29,7 +31,10 @@ void PrintHelp() {
   std::printf(
       "Usage: tvxguest unattended windows [OPTIONS] --out DIR IMAGE\n\n"
       "Recognise the Windows install image IMAGE and write its answer files into DIR\n"
-      "(created when missing): winnt.sif, autoun~0.xml and, with --storepwd, storePwd.ini.\n\n"
+      "(created when missing): winnt.sif, autoun~0.xml and, with --storepwd, storePwd.ini.\n"
+      "The answers are checked first (no control characters, quotes or semicolons,\n"
+      "within the guest's limits); the files are prepared beside DIR and moved into it\n"
+      "only when all of them are complete. They are readable by their owner only.\n\n"
       "Options:\n"
       "  --sif FILE            template of winnt.sif (required)\n"
       "  --xml FILE            template of the unattend XML (required)\n"
@@ -176,6 +181,18 @@ std::vector<std::string> SplitEditions(const char *list) {
   return out;
 }
 
+// FileOrder lists the answer files in the order the help names them.
+int FileOrder(const std::string &path) {
+  const char *names[] = {"winnt.sif", "autoun~0.xml", "storePwd.ini"};
+  for (int i = 0; i < 3; ++i) {
+    if (path.size() >= std::strlen(names[i]) &&
+        path.compare(path.size() - std::strlen(names[i]), std::string::npos, names[i]) == 0) {
+      return i;
+    }
+  }
+  return 3;
+}
+
 int Run(const std::vector<std::string> &args) {
   Options o;
   int rc = Parse(args, &o);
@@ -212,11 +229,34 @@ int Run(const std::vector<std::string> &args) {
     for (const std::string &e : editions) std::fprintf(stderr, "  %s\n", e.c_str());
   }
 
-  std::error_code ec;
-  std::filesystem::create_directories(o.out, ec);
-  if (ec) {
-    std::fprintf(stderr, "tvxguest %s: cannot create %s: %s\n", kName, o.out.c_str(),
-                 ec.message().c_str());
+  // Every answer is checked before anything is written: a line end or a
+  // quote in a text bound for winnt.sif would add keys to it.
+  const struct {
+    const char *label;
+    const std::string *text;
+    bool given;
+    AnswerKind kind;
+  } answers[] = {
+      {"--full-name", &o.fullName, true, AnswerKind::kName},
+      {"--password", &o.password, o.havePassword, AnswerKind::kPassword},
+      {"--product-key", &o.productKey, o.haveKey, AnswerKind::kOther},
+  };
+  for (const auto &a : answers) {
+    if (!a.given) continue;
+    std::string why = CheckAnswer(guess, a.label, *a.text, a.kind, true);
+    if (!why.empty()) {
+      std::fprintf(stderr, "tvxguest %s: %s\n", kName, why.c_str());
+      return 1;
+    }
+  }
+
+  // The files are prepared beside --out and moved in only when all of them
+  // are complete, so a failure leaves nothing new in --out.
+  StagedOutput stage(o.out);
+  std::string stageError;
+  if (!stage.Open(&stageError)) {
+    std::fprintf(stderr, "tvxguest %s: cannot prepare %s: %s\n", kName, o.out.c_str(),
+                 stageError.c_str());
     return 1;
   }
 
@@ -228,18 +268,19 @@ int Run(const std::vector<std::string> &args) {
       o.sif.c_str(), o.xml.c_str(), o.haveStorePwd ? o.storePwd.c_str() : nullptr,
       o.haveKey ? o.productKey.c_str() : nullptr, o.fullName.c_str(),
       o.havePassword ? o.password.c_str() : nullptr, guess.guestOS,
-      static_cast<GuessVersion>(guess.version), o.out.c_str(),
+      static_cast<GuessVersion>(guess.version), stage.dir().c_str(),
       o.haveLanguage ? o.language.c_str() : nullptr, o.imageName.c_str(), o.autoLogon,
       o.keepPartitions);
-  if (ok && o.floppy.wanted) ok = o.floppy.Make(o.out);
+  if (ok && o.floppy.wanted) ok = o.floppy.Make(stage.dir());
   if (!Verbose()) Tvx_SetLogSink(nullptr, nullptr);
-
-  std::vector<std::string> files;
-  for (const char *name : {"winnt.sif", "autoun~0.xml", "storePwd.ini"}) {
-    std::string path = (std::filesystem::path(o.out) / name).string();
-    if (ok && (o.haveStorePwd || std::string(name) != "storePwd.ini")) files.push_back(path);
+  if (ok && !stage.Commit(&stageError)) {
+    log.push_back("cannot move the answer files into " + o.out + ": " + stageError);
+    ok = FALSE;
   }
-  if (o.floppy.wanted) files = ok ? o.floppy.Files(o.out) : std::vector<std::string>();
+  std::vector<std::string> files = ok ? stage.committed() : std::vector<std::string>{};
+  std::sort(files.begin(), files.end(), [](const std::string &a, const std::string &b) {
+    return FileOrder(a) < FileOrder(b);
+  });
   const char *versionName =
       guess.version < GUESS_VERSION_DUMMY_LAST
           ? Guess_GetSubString(static_cast<GuessVersion>(guess.version))

@@ -6,31 +6,8 @@
 #include "command.h"
 #include "tvx_fat.h"
 #include "tvx_floppy.h"
-#include "tvx_log.h"
 
 namespace tvxcli {
-
-namespace {
-
-void Collect(TvxLogLevel, const char *text, void *ctx) {
-  std::string line = text;
-  if (!line.empty() && line.back() == '\n') line.pop_back();
-  static_cast<std::vector<std::string> *>(ctx)->push_back(line);
-}
-
-}  // namespace
-
-LogLines::LogLines() {
-  if (!Verbose()) Tvx_SetLogSink(Collect, &lines_);
-}
-
-LogLines::~LogLines() {
-  if (!Verbose()) Tvx_SetLogSink(nullptr, nullptr);
-}
-
-void LogLines::Print(std::FILE *to) const {
-  for (const std::string &line : lines_) std::fprintf(to, "  %s\n", line.c_str());
-}
 
 const char *FatErrorText(unsigned long code) {
   switch (code) {

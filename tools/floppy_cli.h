@@ -1,27 +1,11 @@
-// Shared by the floppy commands: the library's log lines while a call runs,
-// FAT result texts, and the --floppy options of `unattended windows`.
+// Shared by the floppy commands: FAT result texts, and the --floppy options
+// of `unattended windows`.
 #pragma once
 
-#include <cstdio>
 #include <string>
 #include <vector>
 
 namespace tvxcli {
-
-// LogLines collects the library's log lines while it lives, so a failure can
-// show its reasons without -v (with -v they go to standard error as usual).
-class LogLines {
- public:
-  LogLines();
-  ~LogLines();
-  LogLines(const LogLines &) = delete;
-  LogLines &operator=(const LogLines &) = delete;
-  const std::vector<std::string> &Lines() const { return lines_; }
-  void Print(std::FILE *to) const;
-
- private:
-  std::vector<std::string> lines_;
-};
 
 // FatErrorText names a FAT result code.
 const char *FatErrorText(unsigned long code);

@@ -22,4 +22,18 @@ const char *GuestFamily(const GuessResult &guess);
 // GuestLabel: "centos7-64 (GUESS_VERSION_CENTOS_7)", or "not recognised".
 std::string GuestLabel(const GuessResult &guess);
 
+// What a typed answer is, for CheckAnswer.
+enum class AnswerKind { kPassword, kShortName, kName, kOther };
+
+// CheckAnswer refuses an answer the user typed before anything is written:
+// invalid UTF-8 or a control character (a line end could add a key or a
+// line to an answer file), a text longer than the guest's limit
+// (AutoInstall_GetInstallConfigInfo), one the library's validator refuses
+// (its message) and, when `forIni` (the text goes into an INI file such as
+// winnt.sif), a double quote or a semicolon, which the INI format cannot
+// carry inside a value. Returns "" when the text is fine, else a message that
+// names `label` and the character, e.g. "--password holds a carriage return".
+std::string CheckAnswer(const GuessResult &guess, const char *label, const std::string &text,
+                        AnswerKind kind, bool forIni);
+
 }  // namespace tvxcli

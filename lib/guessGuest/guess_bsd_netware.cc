@@ -3,7 +3,6 @@
 // FreeBSD: the kernel's ELF machine gives the architecture, and the first
 // line of RELNOTES.TXT ("FreeBSD 13.2-RELEASE Release Notes") the release.
 // NetWare: the release is named by a directory at the root.
-#include <strings.h>
 
 #include <cstdint>
 #include <cstring>
@@ -66,7 +65,7 @@ constexpr NetWareRow kNetWareRows[] = {
 
 const char *NetWareId(const char *name) {
   for (const NetWareRow &row : kNetWareRows) {
-    if (strcasecmp(name, row.entry) == 0) return row.guestOS;
+    if (tvx::ascii::Equal(name, row.entry)) return row.guestOS;
   }
   return nullptr;
 }

@@ -4,12 +4,12 @@
 // medium-access calls; these helpers add no other way in.
 #pragma once
 
-#include <cstdlib>
 #include <cstring>
-#include <memory>
 #include <string_view>
 
+#include "platform/ascii.h"
 #include "platform/log.h"
+#include "platform/unique.h"
 #include "tvx_guess.h"
 
 // The source path named by the recognition code's internal-error stops.
@@ -20,12 +20,9 @@ namespace tvx::guess {
 
 // ---- Owning wrappers ----
 
-struct FreeDeleter {
-  void operator()(void *p) const noexcept { std::free(p); }
-};
 // A malloc'd text: file contents from Guess_ReadFile*, values from
 // GuessParseKeyValue, texts from Str_* and Msg_*.
-using Text = std::unique_ptr<char, FreeDeleter>;
+using Text = tvx::CharPtr;
 
 // ReadText reads a whole file by path (case variants as Guess_ReadFileName
 // tries them); empty when the file cannot be read. `out_size` is optional.
@@ -163,17 +160,6 @@ void CloseMedium(GuessMedium *medium);
 }  // namespace tvx::guess
 
 namespace tvx::guess {
-
-// StartsWithCaseless ignores ASCII letter case over the prefix's length
-// (the rule of StrUtil_CaselessStartsWith and strncasecmp).
-inline bool StartsWithCaseless(std::string_view text, std::string_view prefix) {
-  if (text.size() < prefix.size()) return false;
-  auto lower = [](char c) { return c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c; };
-  for (size_t i = 0; i < prefix.size(); i++) {
-    if (lower(text[i]) != lower(prefix[i])) return false;
-  }
-  return true;
-}
 
 // DirExists opens and closes a directory of the medium (with its case
 // variants, as Guess_OpenDir tries them).

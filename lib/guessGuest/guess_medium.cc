@@ -9,7 +9,6 @@
 // recogniser names a file once, the way its vendor usually writes it.
 #include <cstdlib>
 #include <cstring>
-#include <strings.h>
 
 #include "lib/guessGuest/guess_internal.h"
 #include "platform/dynbuf.h"
@@ -112,7 +111,7 @@ bool FindIso(GuessMedium *medium, GuessDir *dir, const char *name, bool wantData
   std::memset(&entry, 0, sizeof entry);
   bool found = false;
   while (Iso9660_ReadDir(medium->isoImage, scan, &entry) == ISO9660_OK) {
-    if (strcasecmp(entry.name, name) == 0) {
+    if (tvx::ascii::Equal(entry.name, name)) {
       found = true;
       break;
     }

@@ -10,23 +10,17 @@
 #include <climits>
 #include <cstring>
 #include <exception>
-#include <memory>
 #include <optional>
 #include <string>
 
 #include "lib/guessGuest/guess_internal.h"
+#include "platform/xml_unique.h"
 #include "tvx_guess.h"
 
 namespace {
 
-using tvx::guess::StartsWithCaseless;
 using tvx::guess::Contains;
 using tvx::guess::Text;
-
-struct XmlDocDeleter {
-  void operator()(xmlDoc *doc) const noexcept { xmlFreeDoc(doc); }
-};
-using UniqueXmlDoc = std::unique_ptr<xmlDoc, XmlDocDeleter>;
 
 bool Named(const xmlNode *node, const char *name) {
   return xmlStrEqual(node->name, reinterpret_cast<const xmlChar *>(name)) != 0;
@@ -45,7 +39,7 @@ bool IsOrkaBuild(const char *text) {
   if (length > INT_MAX) return false;
   // The file comes from an untrusted image: no network, no external DTD, no
   // entity substitution, and no messages on the host's standard error.
-  UniqueXmlDoc doc(xmlReadMemory(text, static_cast<int>(length), "packages.xml", nullptr,
+  tvx::UniquePtr<xmlDoc> doc(xmlReadMemory(text, static_cast<int>(length), "packages.xml", nullptr,
                                  XML_PARSE_NONET | XML_PARSE_NOERROR | XML_PARSE_NOWARNING));
   if (!doc) return false;
   const xmlNode *root = xmlDocGetRootElement(doc.get());
@@ -62,8 +56,8 @@ bool IsOrkaBuild(const char *text) {
     if (Named(child, "name")) name = ElementText(child);
     if (Named(child, "orka_version")) version = ElementText(child);
   }
-  return name && version && StartsWithCaseless(name->c_str(), "Tarvex Orka") &&
-         StartsWithCaseless(version->c_str(), "4.");
+  return name && version && tvx::ascii::StartsWith(name->c_str(), "Tarvex Orka") &&
+         tvx::ascii::StartsWith(version->c_str(), "4.");
 }
 
 struct MenuRow {

@@ -8,7 +8,6 @@
 // configuration (RHEL 7 boot media), a live root file system (Fedora and
 // Asianux live images) or the first line of RELEASE-NOTES (the oldest
 // releases).
-#include <cctype>
 #include <cstdlib>
 #include <cstring>
 #include <string>
@@ -157,8 +156,7 @@ Answer ByNameTable(GuessMedium *medium, const char *name, Arch arch) {
       case ClassRule::kNone:
         break;
       case ClassRule::kRhel7Name: {
-        std::string lower(name);
-        for (char &c : lower) c = static_cast<char>(std::tolower(static_cast<unsigned char>(c)));
+        std::string lower = tvx::ascii::Lower(name);
         answer.version = Contains(lower.c_str(), "server")        ? GUESS_VERSION_RHEL_SERVER
                          : Contains(lower.c_str(), "workstation") ? GUESS_VERSION_RHEL_WORKSTATION
                                                                   : GUESS_VERSION_RHEL_CLIENT;

@@ -1,7 +1,6 @@
 // Solaris install media, known by the release directory at their root
 // ("Solaris_10"); Solaris 11 media have none and describe themselves in
 // ".image_info" instead.
-#include <strings.h>
 
 #include "lib/guessGuest/guess_internal.h"
 #include "tvx_guess.h"
@@ -24,7 +23,7 @@ constexpr SolarisRow kSolaris11 = {".image_info", "solaris11-64", nullptr};
 
 const SolarisRow *RowOf(const char *name) {
   for (const SolarisRow &row : kSolarisRows) {
-    if (strcasecmp(name, row.entry) == 0) return &row;
+    if (tvx::ascii::Equal(name, row.entry)) return &row;
   }
   return nullptr;
 }

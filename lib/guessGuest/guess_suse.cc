@@ -10,7 +10,6 @@
 //                       named ".S.u.S.E-disk-<number>"
 // A medium boots with isolinux when one of the loader directories holds
 // "isolinux.cfg".
-#include <cctype>
 #include <cstdint>
 #include <exception>
 #include <optional>
@@ -23,7 +22,6 @@
 namespace {
 
 using tvx::guess::StartsWith;
-using tvx::guess::StartsWithCaseless;
 using tvx::guess::Contains;
 using tvx::guess::Text;
 
@@ -74,7 +72,7 @@ void ReadRepoId(const char *value, ContentFacts *facts) {
 // Keys and values are separated by blanks, often a run of them to align the
 // values in a column.
 unsigned int SkipBlanks(const std::string &line, size_t pos) {
-  while (pos < line.size() && std::isspace(static_cast<unsigned char>(line[pos]))) pos++;
+  while (pos < line.size() && tvx::ascii::IsSpace(line[pos])) pos++;
   return static_cast<unsigned int>(pos);
 }
 
@@ -141,18 +139,18 @@ const char *FromContent(const char *text, ContentFacts *facts) {
   } else {
     const std::string &product = *facts->product;
     const char *name = product.c_str();
-    if (StartsWithCaseless(name, "SUSE LINUX")) {
+    if (tvx::ascii::StartsWith(name, "SUSE LINUX")) {
       id = Pick(is64, "suse-64", "suse");
-    } else if (StartsWithCaseless(name, "openSUSE")) {
+    } else if (tvx::ascii::StartsWith(name, "openSUSE")) {
       id = Pick(is64, "opensuse-64", "opensuse");
     } else if (StartsWith(name, "SUSE SLE") || StartsWith(name, "SUSE_SLE")) {
       id = SlesByMajor(facts->major, is64);
       EnterpriseClass(product, facts);
     } else if (StartsWith(name, "SLES-for-Tarvex")) {
       id = SlesByMajor(facts->major, is64);
-    } else if (StartsWithCaseless(name, "Sun Java Desktop")) {
+    } else if (tvx::ascii::StartsWith(name, "Sun Java Desktop")) {
       id = "sjds";
-    } else if (StartsWithCaseless(name, "Novell Linux Desktop")) {
+    } else if (tvx::ascii::StartsWith(name, "Novell Linux Desktop")) {
       id = "nld9";
     } else {
       id = facts->repoId;
@@ -181,7 +179,7 @@ const char *FromProducts(GuessMedium *medium, const char *text, uint32_t *versio
     if (Contains(text, "Desktop")) *version = GUESS_VERSION_SLED_ALL;
     return SlesByMajor(major, Contains(text, "x86_64"));
   }
-  if (StartsWithCaseless(name, "SUSE-Linux")) {
+  if (tvx::ascii::StartsWith(name, "SUSE-Linux")) {
     return Pick(Contains(text, "x86_64") || Contains(text, "x86-64"), "suse-64", "suse");
   }
   if (StartsWith(name, "openSUSE-Leap 15.") || StartsWith(name, "openSUSE 2018")) {

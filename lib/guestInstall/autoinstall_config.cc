@@ -6,6 +6,7 @@
 #include "platform/guestos.h"
 #include "platform/str.h"
 
+namespace tvx::autoinstall {
 namespace {
 
 // The localised names of the administrator account share the stem
@@ -63,6 +64,10 @@ const InstallFamilyRow installConfigTable[] = {
     {"linux", 32, 127, {0, 1, 1, 1}, kLinuxShortNames, kLinuxGuests},
     {nullptr, 0, 0, {0, 0, 0, 0}, nullptr, nullptr},
 };
+
+}  // namespace tvx::autoinstall
+
+using namespace tvx::autoinstall;
 
 extern "C" {
 

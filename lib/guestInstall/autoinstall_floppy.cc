@@ -52,7 +52,12 @@ Bool AddFileToFloppyImg(FATDirectory *dir, const char *hostPath, const char *ima
       break;
     }
   }
-  if (file != nullptr) FAT_CloseFile(file);
+  // The volume is written back when the file closes: a failure there is a
+  // failed write.
+  if (file != nullptr && (err = FAT_CloseFile(file)) != FAT_OK && ok) {
+    Log("%s: FAT_WriteFile failed, error: %lu\n", kFn, err);
+    ok = FALSE;
+  }
   FileIO_Close(&fd);
   return ok;
 }

@@ -2,10 +2,23 @@
 // answer-file code. Not exported.
 #pragma once
 
+#include <string>
+
 #include "tvx_autoinstall.h"
 
 // The source path that NOT_REACHED names for this part of the library.
 #define AUTOINSTALL_SOURCE_PATH "lib/guestInstall/autoinstall"
+
+namespace tvx::autoinstall {
+
+// AutoInstallIniValueProblem checks a user's text bound for an INI answer
+// file under `key` against what the INI writer can carry: it must not hold
+// a line end or other control character (it would add a key or a section),
+// a double quote (it would end the quoted value) or a semicolon (a reader
+// cuts the value there), and must fit the writer's line without clipping.
+// Returns "" when the text is fine, else the reason, e.g. "holds a line
+// feed". Every INI value that comes from a user goes through it first.
+std::string AutoInstallIniValueProblem(const char *key, const char *value);
 
 // AutoInstallGetLinuxKind classifies a Linux guest-OS identifier by its
 // (case-sensitive) prefix; NULL and unknown identifiers give
@@ -43,3 +56,5 @@ struct InstallFamilyRow {
 };
 
 extern const InstallFamilyRow installConfigTable[];
+
+}  // namespace tvx::autoinstall

@@ -1,12 +1,17 @@
 // The Linux support rule, the Linux text rules and the validators' dispatch.
+#include <algorithm>
+#include <cstdio>
 #include <cstring>
+#include <string>
 #include <initializer_list>
 
 #include "lib/guestInstall/autoinstall_internal.h"
+#include "platform/ascii.h"
 #include "platform/log.h"
 #include "platform/msg.h"
 #include "platform/str.h"
 
+namespace tvx::autoinstall {
 namespace {
 
 constexpr const char *kBadLinuxName =
@@ -63,6 +68,29 @@ void AutoInstallSetMessage(char **out_message, const char *idFmt) {
   if (out_message != nullptr) *out_message = Msg_GetString(idFmt);
 }
 
+std::string AutoInstallIniValueProblem(const char *key, const char *value) {
+  // The writer's longest line: key, "=", two quotes and the newline within
+  // the 1020 bytes it keeps.
+  size_t room = 1020 - std::min<size_t>(1020, std::strlen(key) + 4);
+  for (const char *p = value; *p != '\0'; ++p) {
+    switch (*p) {
+      case '\n': return "holds a line feed";
+      case '\r': return "holds a carriage return";
+      case '"': return "holds a double quote (\")";
+      case ';': return "holds a semicolon (;), which ends the value when it is read";
+      default:
+        if (tvx::ascii::IsControl(*p)) {
+          char buf[64];
+          std::snprintf(buf, sizeof buf, "holds the control character 0x%02x",
+                        static_cast<unsigned char>(*p));
+          return buf;
+        }
+    }
+  }
+  if (std::strlen(value) > room) return "is longer than " + std::to_string(room) + " bytes";
+  return "";
+}
+
 AutoInstallLinuxKind AutoInstallGetLinuxKind(const char *guestOS) {
   static const struct {
     const char *prefix;
@@ -93,6 +121,10 @@ AutoInstallTextError AutoInstallValidateText(const char *family, const GuessResu
   }
   NOT_REACHED_AT(AUTOINSTALL_SOURCE_PATH);
 }
+
+}  // namespace tvx::autoinstall
+
+using namespace tvx::autoinstall;
 
 extern "C" {
 

@@ -4,9 +4,13 @@
 // code page of the installation language) and the unattend XML (UTF-8).
 #include <cstdlib>
 #include <cstring>
+#include <string>
 
+#include "lib/guestInstall/autoinstall_internal.h"
 #include "lib/guestInstall/autoinstall_windows_xml.h"
 #include "platform/file.h"
+#include "platform/file_replace.h"
+#include "platform/fileio.h"
 #include "platform/guestos.h"
 #include "platform/log.h"
 #include "platform/unique.h"
@@ -16,6 +20,7 @@
 #include "tvx_autoinstall_windows.h"
 #include "tvx_ini.h"
 
+namespace tvx::autoinstall {
 namespace {
 
 constexpr char kFn[] = "AutoInstall_PrepareAnswerFileEx";
@@ -46,12 +51,6 @@ bool NonEmpty(const char *s) { return s != nullptr && *s != '\0'; }
 
 const char *OrNull(const char *s) { return s != nullptr ? s : "(null)"; }
 
-bool CopyTemplate(const char *from, const char *to) {
-  if (from != nullptr && File_Copy(from, to, TRUE)) return true;
-  Log("%s: File_Copy from=\"%s\" to=\"%s\"\n", kFn, OrNull(from), to);
-  return false;
-}
-
 // ToCodePage converts a user text for winnt.sif. Setup shows a text it
 // cannot decode as garbage, which beats losing the answer, so an
 // unconvertible text is written as it came.
@@ -80,6 +79,59 @@ struct Inputs {
   Bool autoLogon;
   Bool keepPartitions;
 };
+
+// Templates are a few kilobytes; the bound keeps a wrong path (a disk image,
+// say) from being loaded whole.
+constexpr uint64_t kMaxTemplateBytes = 16u << 20;
+
+bool ReadTemplate(const char *path, std::string *out) {
+  FileIODescriptor fd;
+  FileIO_Invalidate(&fd);
+  if (FileIO_Open(&fd, path, FILEIO_OPEN_ACCESS_READ, FILEIO_OPEN) != FILEIO_SUCCESS) return false;
+  uint64_t size = FileIO_GetSize(&fd);
+  bool ok = size <= kMaxTemplateBytes;
+  if (ok) {
+    out->assign(static_cast<size_t>(size), '\0');
+    ok = size == 0 || FileIO_Pread(&fd, out->data(), out->size(), 0) == FILEIO_SUCCESS;
+  }
+  FileIO_Close(&fd);
+  return ok;
+}
+
+// CopyTemplate makes `to` a fresh copy of the template. Every answer file may
+// end up holding the password, so it is private (0600) from the start, and a
+// file or link already at `to` is replaced, never written through.
+bool CopyTemplate(const char *from, const char *to) {
+  std::string data;
+  FileReplaceOptions options;
+  options.links = FileLinkPolicy::kReplaceLink;
+  options.secret = true;
+  if (from != nullptr && ReadTemplate(from, &data) && File_ReplaceContents(to, data, options)) {
+    return true;
+  }
+  Log("%s: File_Copy from=\"%s\" to=\"%s\"\n", kFn, OrNull(from), to);
+  return false;
+}
+
+// CheckIniTexts refuses, before any file is made, a text that the INI writer
+// would let add a key or a section (a line end), end its quotes early ("),
+// have cut when read back (;) or clip (too long for its line).
+bool CheckIniTexts(const Inputs &in) {
+  const struct {
+    const char *key;
+    const char *text;
+  } texts[] = {{"ProductKey", in.productKey}, {"FullName", in.fullName},
+               {"AdminPassword", in.adminPassword}};
+  for (const auto &t : texts) {
+    if (t.text == nullptr) continue;
+    std::string why = AutoInstallIniValueProblem(t.key, t.text);
+    if (!why.empty()) {
+      Log("%s: %s %s\n", kFn, t.key, why.c_str());
+      return false;
+    }
+  }
+  return true;
+}
 
 // WriteSif fills the user's answers and the host's time-zone index into
 // winnt.sif and, with a password, the logon setting into storePwd.ini.
@@ -153,6 +205,7 @@ bool Prepare(const Inputs &in) {
   const char *language = in.language;
   if (!NonEmpty(language)) language = GuestOS_IsWinVistaOrHigher(osId) ? "en-US" : "English";
   StringEncoding encoding = EncodingForLanguage(language);
+  if (!CheckIniTexts(in)) return false;
 
   tvx::CharPtr sifPath(File_PathJoin(in.outputDir, "winnt.sif"));
   tvx::CharPtr xmlPath(File_PathJoin(in.outputDir, "autoun~0.xml"));
@@ -181,6 +234,10 @@ bool Prepare(const Inputs &in) {
 }
 
 }  // namespace
+
+}  // namespace tvx::autoinstall
+
+using namespace tvx::autoinstall;
 
 extern "C" TVX_EXPORT Bool AutoInstall_PrepareAnswerFileEx(
     const char *sifTemplatePath, const char *xmlTemplatePath, const char *storePwdTemplatePath,

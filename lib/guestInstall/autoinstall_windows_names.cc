@@ -15,6 +15,7 @@
 #include "platform/str.h"
 #include "platform/util.h"
 
+namespace tvx::autoinstall {
 namespace {
 
 struct NameMessage {
@@ -155,6 +156,10 @@ char *PrettyName(const char *raw) {
 }
 
 }  // namespace
+
+}  // namespace tvx::autoinstall
+
+using namespace tvx::autoinstall;
 
 extern "C" {
 

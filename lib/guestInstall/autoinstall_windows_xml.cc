@@ -7,8 +7,10 @@
 
 #include <cstring>
 
+#include "platform/file_replace.h"
 #include "platform/xml_unique.h"
 
+namespace tvx::autoinstall {
 namespace {
 
 #define OOBE_SHELL                                   \
@@ -189,5 +191,19 @@ Bool AutoInstallEditUnattendXml(const char *xmlPath, const char *productKey,
        language, imageName, autoLogon, keepPartitions);
 
   ctx.reset();
-  return xmlSaveFile(xmlPath, doc.get()) >= 0;
+  // The file holds the password: it is replaced as a private file, never
+  // written through whatever link its name might be.
+  xmlChar *text = nullptr;
+  int size = 0;
+  xmlDocDumpMemory(doc.get(), &text, &size);
+  tvx::XmlChars owned(text);
+  if (text == nullptr || size < 0) return FALSE;
+  FileReplaceOptions options;
+  options.links = FileLinkPolicy::kReplaceLink;
+  options.secret = true;
+  return File_ReplaceContents(
+      xmlPath, std::string_view(reinterpret_cast<const char *>(text), static_cast<size_t>(size)),
+      options);
 }
+
+}  // namespace tvx::autoinstall

@@ -13,6 +13,8 @@
 // context made here.
 #define AUTOINSTALL_UNATTEND_NS "urn:schemas-microsoft-com:unattend"
 
+namespace tvx::autoinstall {
+
 // AutoInstallXmlNewContext returns an XPath context on `doc` with the "urn"
 // prefix registered, or null.
 xmlXPathContext *AutoInstallXmlNewContext(xmlDoc *doc);
@@ -53,3 +55,5 @@ Bool AutoInstallEditUnattendXml(const char *xmlPath, const char *productKey,
                                 const char *timeZoneName, GuestOSID osId, uint32_t version,
                                 const char *language, const char *imageName, Bool autoLogon,
                                 Bool keepPartitions);
+
+}  // namespace tvx::autoinstall

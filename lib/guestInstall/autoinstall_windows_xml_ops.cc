@@ -14,6 +14,7 @@
 #include "platform/xml_unique.h"
 #include "platform/str.h"
 
+namespace tvx::autoinstall {
 namespace {
 
 constexpr char kFirstLogonOrders[] =
@@ -186,3 +187,5 @@ Bool AutoInstallXmlAddFirstLogonCommand(xmlDoc *doc, const char *commandLine) {
   Append(commands, command, node);
   return TRUE;
 }
+
+}  // namespace tvx::autoinstall

@@ -10,10 +10,12 @@ bool LineReader::Next(std::string *piece) {
   while (piece->size() < kMaxPiece) {
     if (pos_ == buf_.size()) {
       buf_.resize(64 * 1024);
-      size_t n = std::fread(buf_.data(), 1, buf_.size(), f_);
-      buf_.resize(n);
+      size_t n = 0;
+      FileIOResult r = FileIO_Read(&fd_, buf_.data(), buf_.size(), &n);
+      failed_ = r != FILEIO_SUCCESS && r != FILEIO_READ_ERROR_EOF;
+      buf_.resize(failed_ ? 0 : n);
       pos_ = 0;
-      if (n == 0) break;
+      if (buf_.empty()) break;
     }
     size_t want = std::min(kMaxPiece - piece->size(), buf_.size() - pos_);
     const char *start = buf_.data() + pos_;
@@ -49,18 +51,6 @@ KeyLine ParseKeyLine(std::string_view line) {
   while (end > start && (line[end - 1] == '\n' || line[end - 1] == '\r')) --end;
   k.key = line.substr(start, end - start);
   return k;
-}
-
-bool CaselessEqual(std::string_view a, std::string_view b) {
-  if (a.size() != b.size()) return false;
-  for (size_t i = 0; i < a.size(); ++i) {
-    unsigned char x = static_cast<unsigned char>(a[i]);
-    unsigned char y = static_cast<unsigned char>(b[i]);
-    if (x >= 'A' && x <= 'Z') x = static_cast<unsigned char>(x - 'A' + 'a');
-    if (y >= 'A' && y <= 'Z') y = static_cast<unsigned char>(y - 'A' + 'a');
-    if (x != y) return false;
-  }
-  return true;
 }
 
 std::string_view AsCString(std::string_view line) {

@@ -3,9 +3,11 @@
 #pragma once
 
 #include <cstddef>
-#include <cstdio>
 #include <string>
 #include <string_view>
+
+#include "platform/ascii.h"
+#include "platform/fileio.h"
 
 namespace tvx::ini {
 
@@ -20,17 +22,25 @@ inline constexpr size_t kMaxPiece = kLineBuffer - 1;
 inline constexpr size_t kCollectLimit = 0x7F800;
 inline constexpr size_t kOutputBuffer = 0x80000;
 
-// Reads pieces of a FILE: up to and including the next '\n', at most kMaxPiece
-// bytes. Bytes are kept as they are, NULs included.
+// Reads pieces of a file: up to and including the next '\n', at most
+// kMaxPiece bytes. Bytes are kept as they are, NULs included.
 class LineReader {
  public:
-  explicit LineReader(FILE *f) : f_(f) {}
+  LineReader() { FileIO_Invalidate(&fd_); }
+  ~LineReader() { FileIO_Close(&fd_); }
+  LineReader(const LineReader &) = delete;
+  LineReader &operator=(const LineReader &) = delete;
+
+  bool Open(const char *path) {
+    return FileIO_Open(&fd_, path, FILEIO_OPEN_ACCESS_READ, FILEIO_OPEN) == FILEIO_SUCCESS;
+  }
   // False at end of file or on a read error (see Failed).
   bool Next(std::string *piece);
-  bool Failed() const { return std::ferror(f_) != 0; }
+  bool Failed() const { return failed_; }
 
  private:
-  FILE *f_;
+  FileIODescriptor fd_;
+  bool failed_ = false;
   std::string buf_;
   size_t pos_ = 0;
 };
@@ -55,9 +65,6 @@ struct KeyLine {
   size_t valueOffset = 0;  // first byte after the "=" (hasEquals only)
 };
 KeyLine ParseKeyLine(std::string_view line);
-
-// Caseless ASCII equality, as strcasecmp.
-bool CaselessEqual(std::string_view a, std::string_view b);
 
 // Cuts `line` at the first NUL, as a C string would end.
 std::string_view AsCString(std::string_view line);

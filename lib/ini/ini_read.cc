@@ -1,9 +1,7 @@
 // Reading single values: IniUtil_GetIniFileString and IniUtil_GetIniFileInt.
 #include <cstdint>
-#include <cstdio>
 #include <cstdlib>
 #include <cstring>
-#include <memory>
 #include <string>
 
 #include "lib/ini/ini_line.h"
@@ -11,10 +9,6 @@
 
 namespace tvx::ini {
 namespace {
-
-struct FileCloser {
-  void operator()(FILE *f) const { std::fclose(f); }
-};
 
 bool IsBlank(char c) { return c == ' ' || c == '\t'; }
 bool IsTrailing(char c) { return c == ' ' || c == '\t' || c == '\r' || c == '\n'; }
@@ -39,9 +33,8 @@ Bool GetString(const char *path, const char *section, const char *key, char *out
   if (out == nullptr || size < 1 || path == nullptr || section == nullptr || key == nullptr) {
     return FALSE;
   }
-  std::unique_ptr<FILE, FileCloser> f(std::fopen(path, "r"));
-  if (!f) return FALSE;
-  LineReader reader(f.get());
+  LineReader reader;
+  if (!reader.Open(path)) return FALSE;
   std::string piece;
   bool inSection = false;
   while (reader.Next(&piece)) {
@@ -53,12 +46,12 @@ Bool GetString(const char *path, const char *section, const char *key, char *out
     if (KindOf(line) == LineKind::kHeader) {
       std::string_view name;
       if (!HeaderName(line, &name)) return FALSE;
-      inSection = CaselessEqual(name, section);
+      inSection = ascii::Equal(name, section);
       continue;
     }
     if (!inSection) continue;
     KeyLine k = ParseKeyLine(line);
-    if (!CaselessEqual(k.key, key)) continue;
+    if (!ascii::Equal(k.key, key)) continue;
     std::string_view raw = k.hasEquals ? line.substr(k.valueOffset) : std::string_view();
     std::string_view v = ReadValue(raw, static_cast<size_t>(size) - 1);
     if (!v.empty()) std::memcpy(out, v.data(), v.size());

@@ -6,22 +6,16 @@
 // is judged exactly as the reader judges it, inline comments included, so
 // that a value written is the value read back.
 #include <cstdint>
-#include <cstdio>
 #include <cstring>
-#include <memory>
 #include <string>
 #include <string_view>
 
 #include "lib/ini/ini_line.h"
-#include "lib/ini/ini_replace.h"
+#include "platform/file_replace.h"
 #include "tvx_ini.h"
 
 namespace tvx::ini {
 namespace {
-
-struct FileCloser {
-  void operator()(FILE *f) const { std::fclose(f); }
-};
 
 // A value may fill its line up to 1020 bytes counted from the line's start,
 // which leaves room for two quotes and the newline within one line piece.
@@ -68,8 +62,9 @@ class Writer {
     out_.reserve(kOutputBuffer);
   }
 
-  bool Run(FILE *f) {
-    LineReader reader(f);
+  bool Run(const char *path) {
+    LineReader reader;
+    if (!reader.Open(path)) return false;
     std::string piece;
     bool skipContinuation = false;
     while (reader.Next(&piece)) {
@@ -110,14 +105,14 @@ class Writer {
         }
         std::string_view name;
         if (!HeaderName(line, &name)) return false;
-        inSection_ = CaselessEqual(name, section_);
+        inSection_ = ascii::Equal(name, section_);
         seen_ = seen_ || inSection_;
         break;
       }
       case LineKind::kKey: {
         if (!inSection_ || written_) break;
         KeyLine k = ParseKeyLine(line);
-        if (!CaselessEqual(k.key, key_)) break;
+        if (!ascii::Equal(k.key, key_)) break;
         out_ += Replacement(piece, k);
         written_ = true;
         replacedNow_ = true;
@@ -161,11 +156,12 @@ Bool WriteString(const char *path, const char *section, const char *key, const c
   if (path == nullptr || section == nullptr || key == nullptr || value == nullptr) return FALSE;
   if (!Writable(section, key, value)) return FALSE;
   Writer w(section, key, value, quoted != FALSE);
-  {
-    std::unique_ptr<FILE, FileCloser> f(std::fopen(path, "r"));
-    if (!f || !w.Run(f.get())) return FALSE;
-  }
-  return ReplaceFileContents(path, w.Text()) ? TRUE : FALSE;
+  if (!w.Run(path)) return FALSE;
+  // The caller's existing file is edited: a link to it stays a link.
+  FileReplaceOptions options;
+  options.links = FileLinkPolicy::kFollowLink;
+  options.mustExist = true;
+  return File_ReplaceContents(path, w.Text(), options);
 }
 
 }  // namespace

@@ -23,8 +23,9 @@ TVX_BEGIN_DECLS
  * deleted and re-created; otherwise the file is created. TRUE on success.
  * When the host file cannot be opened nothing in the image is touched; after
  * a later failure (the volume full, among others) the image file keeps what
- * was copied before it. The image is written back when `dir` (or the
- * volume) is closed. */
+ * was copied before it. The image file is written when the copied file is
+ * closed at the end; a failure to write it fails the call (logged as a
+ * failed FAT_WriteFile). */
 TVX_EXPORT Bool AddFileToFloppyImg(FATDirectory *dir, const char *hostPath,
                                    const char *imageName);
 

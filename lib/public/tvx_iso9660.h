@@ -7,8 +7,9 @@
  *
  * Names. An entry's name is, in this order of preference among the formats
  * the image holds and the open mode allows: its Rock Ridge name, its Joliet
- * name (as UTF-8), or its ISO 9660 name without the ";1" version (a level-1
- * name without extension keeps its dot: "KERNEL."). Directory paths use "/"
+ * name (as UTF-8), or its ISO 9660 name without the ";1" version and without
+ * the dot of a name that has no extension ("KERNEL." is listed as "KERNEL").
+ * Bytes of a name that are not UTF-8 come back as U+FFFD. Directory paths use "/"
  * between components; "" and "/" name the root. Path components are matched
  * exactly first and then without regard to ASCII letter case.
  *
@@ -22,8 +23,11 @@
  *
  * Limits. The reader refuses (ISO9660_ERR_CORRUPT) directories larger than
  * 16 MiB, directory paths through a directory loop, extents beyond the end of
- * the image and records whose lengths or both-endian copies disagree.
- * Extraction refuses trees nested deeper than 128 levels.
+ * the image or overlapping one another within a file, and records whose
+ * lengths or both-endian copies disagree. Walks of a whole tree
+ * (Iso9660_ListTree, Iso9660_Extract) also refuse a directory reached twice
+ * (a loop or a directory shared by two parents), more entries than the image
+ * has room for and trees nested deeper than 128 levels.
  *
  * Handles. Directory and file handles belong to the image that opened them;
  * passing one to another image fails with ISO9660_ERR_ARGUMENT. Calls on one
@@ -125,20 +129,33 @@ TVX_EXPORT int Iso9660_CloseFile(Iso9660Image *image, Iso9660File *file);
 /* Iso9660_Extract copies into the host directory `destDir` (created with its
  * parents when missing) the file at `pathInImage` under its own name in the
  * image, or, when `pathInImage` names a directory, that directory's contents
- * with all subdirectories ("", "/" or NULL: the root's contents). Existing
- * files are replaced. The whole tree is checked before anything is written:
- * an entry name that would leave `destDir` ("", ".", "..", "/" inside a name)
- * fails with ISO9660_ERR_UNSAFE, a directory loop or bad extent with
- * ISO9660_ERR_CORRUPT, and nothing is written then. Symbolic links recorded
- * in the image are skipped; an existing symbolic link below `destDir` where an
- * entry goes fails with ISO9660_ERR_UNSAFE and is never followed. A failure
- * while writing leaves what was written so far. */
+ * with all subdirectories ("", "/" or NULL: the root's contents). The whole
+ * tree is checked before anything is written, and nothing is written when it
+ * fails: an entry name that would leave `destDir` ("", ".", "..", "/" inside
+ * a name) fails with ISO9660_ERR_UNSAFE; a directory loop or shared
+ * directory, a name twice in one directory, a bad extent or file data adding
+ * up to more than the image holds fail with ISO9660_ERR_CORRUPT. Symbolic
+ * links recorded in the image are skipped. An existing file (or link) where
+ * a file goes is replaced, never written through; an existing symbolic link
+ * where a directory goes fails with ISO9660_ERR_UNSAFE. A failure while
+ * writing leaves what was written so far. */
 TVX_EXPORT int Iso9660_Extract(Iso9660Image *image, const char *pathInImage,
                                const char *destDir);
 /* Iso9660_ExtractFileEx copies the file at `pathInImage` to the host path
  * `targetPath` (created or replaced; removed again when the copy fails). */
 TVX_EXPORT int Iso9660_ExtractFileEx(Iso9660Image *image, const char *pathInImage,
                                      const char *targetPath);
+
+/* Iso9660TreeCB receives one entry of Iso9660_ListTree: its path relative to
+ * the listed directory, whether it is a directory, and its size. Return TRUE
+ * to go on; FALSE stops the walk (which then returns ISO9660_ERR_IO). */
+typedef Bool (*Iso9660TreeCB)(void *ctx, const char *relPath, Bool isDirectory, uint64_t size);
+/* Iso9660_ListTree hands every entry of the directory at `path` (NULL, ""
+ * or "/": the root) to `callback`, and with `recursive` every entry below it,
+ * depth first. Returns 0, or a failure code; a tree that breaks the limits
+ * above fails with ISO9660_ERR_CORRUPT after the entries reached so far. */
+TVX_EXPORT int Iso9660_ListTree(Iso9660Image *image, const char *path, Bool recursive,
+                                Iso9660TreeCB callback, void *ctx);
 
 TVX_END_DECLS
 

@@ -11,7 +11,8 @@
  * all ones and one "UDF: ..." line goes to the log sink. An image that holds
  * no UDF volume at all fails without logging, since callers probe media.
  * Entries whose names cannot be one path component (empty, ".", "..", or
- * holding "/" or NUL) are never listed or opened.
+ * holding "/" or NUL) are never listed or opened by name; UDF_ListTree shows
+ * them with an empty name and UDF_Extract refuses a tree that holds one.
  */
 #ifndef TVX_UDF_H
 #define TVX_UDF_H
@@ -70,6 +71,43 @@ TVX_EXPORT uint64_t UDF_GetFileSize(UDFVolume *volume, UDFFile *file);
  * read. Unrecorded (sparse) parts read as zeros. */
 TVX_EXPORT Bool UDF_PReadFile(UDFFile *file, void *buffer, uint64_t offset, size_t length);
 TVX_EXPORT void UDF_CloseFile(UDFFile *file);
+
+/* Results of UDF_ListTree and UDF_Extract: the numbers of Iso9660Result, so
+ * that one table of messages serves both readers. */
+typedef enum UDFTreeResult {
+  UDF_TREE_OK = 0,
+  UDF_TREE_ERR_ARGUMENT = 1,
+  UDF_TREE_ERR_IO = 2,        /* the image or a host file could not be read or written */
+  UDF_TREE_ERR_NOT_FOUND = 3,
+  UDF_TREE_ERR_CORRUPT = 4,   /* a structure of the image is invalid */
+  UDF_TREE_ERR_UNSAFE = 7,    /* an entry name would leave the extraction target */
+  UDF_TREE_ERR_NOT_DIR = 8,
+  UDF_TREE_ERR_IS_DIR = 9,
+} UDFTreeResult;
+
+/* UDFTreeCB receives one entry of UDF_ListTree: its path relative to the
+ * listed directory, whether it is a directory, and its size. TRUE goes on;
+ * FALSE stops the walk (UDF_TREE_ERR_IO). */
+typedef Bool (*UDFTreeCB)(void *ctx, const char *relPath, Bool isDirectory, uint64_t size);
+/* UDF_ListTree hands every entry of the directory at `path` (NULL, "" or
+ * "/": the root) to `callback`, and with `recursive` every entry below it,
+ * depth first. A directory reached twice (a loop, or children shared between
+ * directories), more entries than the image has room for or nesting deeper
+ * than 128 levels fail with UDF_TREE_ERR_CORRUPT after the entries reached so
+ * far. */
+TVX_EXPORT int UDF_ListTree(UDFVolume *volume, const char *path, Bool recursive,
+                            UDFTreeCB callback, void *ctx);
+/* UDF_Extract copies into the host directory `destDir` (created with its
+ * parents) the file at `pathInImage` under its own name, or the contents of
+ * the directory at `pathInImage` with all subdirectories, under the same
+ * rules as Iso9660_Extract: the whole tree is checked first and nothing is
+ * written when an entry name would leave `destDir` (UDF_TREE_ERR_UNSAFE), when
+ * the tree loops or shares a directory, holds a name twice in one directory
+ * or its files' data add up past the image's size (UDF_TREE_ERR_CORRUPT).
+ * Links and devices are skipped; unrecorded parts of files become holes of
+ * sparse output files. An existing file where a file goes is replaced, never
+ * written through. */
+TVX_EXPORT int UDF_Extract(UDFVolume *volume, const char *pathInImage, const char *destDir);
 
 TVX_END_DECLS
 

@@ -243,7 +243,9 @@ TVX_EXPORT int Iso9660_Extract(Iso9660Image *image, const char *pathInImage,
                                const char *destDir) {
   if (image == nullptr || destDir == nullptr || destDir[0] == '\0') return ISO9660_ERR_ARGUMENT;
   try {
-    return tvx::iso9660::ExtractTree(*image->image, PathOrRoot(pathInImage), destDir);
+    auto tree = tvx::iso9660::NewTreeSource(*image->image);
+    return tvx::media::ResultCode(
+        tvx::media::ExtractTree(*tree, PathOrRoot(pathInImage), destDir));
   } catch (...) {
     return ISO9660_ERR_IO;
   }
@@ -256,7 +258,20 @@ TVX_EXPORT int Iso9660_ExtractFileEx(Iso9660Image *image, const char *pathInImag
     return ISO9660_ERR_ARGUMENT;
   }
   try {
-    return tvx::iso9660::ExtractFileTo(*image->image, pathInImage, targetPath);
+    auto tree = tvx::iso9660::NewTreeSource(*image->image);
+    return tvx::media::ResultCode(tvx::media::ExtractFile(*tree, pathInImage, targetPath));
+  } catch (...) {
+    return ISO9660_ERR_IO;
+  }
+}
+
+TVX_EXPORT int Iso9660_ListTree(Iso9660Image *image, const char *path, Bool recursive,
+                                Iso9660TreeCB callback, void *ctx) {
+  if (image == nullptr || callback == nullptr) return ISO9660_ERR_ARGUMENT;
+  try {
+    auto tree = tvx::iso9660::NewTreeSource(*image->image);
+    return tvx::media::ResultCode(
+        tvx::media::ListTree(*tree, PathOrRoot(path), recursive != 0, callback, ctx));
   } catch (...) {
     return ISO9660_ERR_IO;
   }

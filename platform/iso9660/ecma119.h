@@ -6,6 +6,8 @@
 #include <cstddef>
 #include <cstdint>
 
+#include "platform/endian.h"
+
 namespace tvx::iso9660 {
 
 constexpr uint32_t kBlockSize = 2048;
@@ -44,30 +46,15 @@ constexpr uint8_t kFlagDirectory = 0x02;
 constexpr uint8_t kFlagAssociated = 0x04;
 constexpr uint8_t kFlagMultiExtent = 0x80;
 
-inline uint16_t Le16(const uint8_t *p) {
-  return static_cast<uint16_t>(static_cast<unsigned>(p[0]) | static_cast<unsigned>(p[1]) << 8);
-}
-inline uint32_t Le32(const uint8_t *p) {
-  return static_cast<uint32_t>(p[0]) | static_cast<uint32_t>(p[1]) << 8 |
-         static_cast<uint32_t>(p[2]) << 16 | static_cast<uint32_t>(p[3]) << 24;
-}
-inline uint32_t Be32(const uint8_t *p) {
-  return static_cast<uint32_t>(p[3]) | static_cast<uint32_t>(p[2]) << 8 |
-         static_cast<uint32_t>(p[1]) << 16 | static_cast<uint32_t>(p[0]) << 24;
-}
-inline uint16_t Be16(const uint8_t *p) {
-  return static_cast<uint16_t>(static_cast<unsigned>(p[1]) | static_cast<unsigned>(p[0]) << 8);
-}
-
 // Both32 reads a both-byte-order number (ECMA-119 7.3.3); false when the two
 // copies disagree. The caller has checked that 8 bytes are there.
 inline bool Both32(const uint8_t *p, uint32_t *out) {
-  *out = Le32(p);
-  return *out == Be32(p + 4);
+  *out = LoadLe32(p);
+  return *out == LoadBe32(p + 4);
 }
 inline bool Both16(const uint8_t *p, uint16_t *out) {
-  *out = Le16(p);
-  return *out == Be16(p + 2);
+  *out = LoadLe16(p);
+  return *out == LoadBe16(p + 2);
 }
 
 }  // namespace tvx::iso9660

@@ -35,4 +35,24 @@ int FileReader::Read(Image &image, void *buf, size_t *inout_len) {
   return done == 0 ? ISO9660_END : ISO9660_OK;
 }
 
+int Image::ReadNodeAt(const Node &file, uint64_t offset, void *buf, size_t len) {
+  if (offset > file.size || len > file.size - offset) return ISO9660_ERR_IO;
+  auto *out = static_cast<uint8_t *>(buf);
+  uint64_t start = 0;
+  for (const Extent &e : file.extents) {
+    if (len == 0) break;
+    uint64_t end = start + e.length;
+    if (offset < end) {
+      size_t n = static_cast<size_t>(std::min<uint64_t>(end - offset, len));
+      int rc = ReadAt(e.offset + (offset - start), out, n);
+      if (rc != ISO9660_OK) return rc;
+      out += n;
+      offset += n;
+      len -= n;
+    }
+    start = end;
+  }
+  return len == 0 ? ISO9660_OK : ISO9660_ERR_IO;
+}
+
 }  // namespace tvx::iso9660

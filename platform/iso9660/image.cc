@@ -10,6 +10,7 @@
 #include <cstring>
 
 #include "tvx_iso9660.h"
+#include "platform/ascii.h"
 #include "platform/iso9660/ecma119.h"
 #include "platform/iso9660/image.h"
 #include "platform/iso9660/names.h"
@@ -20,17 +21,6 @@ namespace {
 
 bool Inside(const Extent &e, uint64_t limit) {
   return e.offset <= limit && e.length <= limit - e.offset;
-}
-
-bool EqualsNoCase(std::string_view a, std::string_view b) {
-  if (a.size() != b.size()) return false;
-  for (size_t i = 0; i < a.size(); ++i) {
-    unsigned char x = static_cast<unsigned char>(a[i]), y = static_cast<unsigned char>(b[i]);
-    if (x >= 'A' && x <= 'Z') x = static_cast<unsigned char>(x + 32);
-    if (y >= 'A' && y <= 'Z') y = static_cast<unsigned char>(y + 32);
-    if (x != y) return false;
-  }
-  return true;
 }
 
 }  // namespace
@@ -69,6 +59,20 @@ int Image::CheckExtents(const Node &file) const {
   for (const Extent &e : file.extents) {
     if (!Inside(e, facts_.limit)) {
       Log("Iso9660: data of \"%s\" lies beyond the end of the image\n", file.name.c_str());
+      return ISO9660_ERR_CORRUPT;
+    }
+  }
+  // The extents of one file are distinct parts of the image (ECMA-119 6.5.1):
+  // a file of overlapping extents would read the same bytes again and again.
+  std::vector<Extent> sorted;
+  for (const Extent &e : file.extents) {
+    if (e.length != 0) sorted.push_back(e);
+  }
+  std::sort(sorted.begin(), sorted.end(),
+            [](const Extent &a, const Extent &b) { return a.offset < b.offset; });
+  for (size_t i = 1; i < sorted.size(); ++i) {
+    if (sorted[i].offset < sorted[i - 1].offset + sorted[i - 1].length) {
+      Log("Iso9660: extents of \"%s\" overlap\n", file.name.c_str());
       return ISO9660_ERR_CORRUPT;
     }
   }
@@ -252,7 +256,7 @@ int Image::Resolve(std::string_view path, Node *out) {
     }
     if (found == nullptr) {
       for (const Node &n : listing->nodes) {
-        if (EqualsNoCase(n.name, comp)) {
+        if (ascii::Equal(n.name, comp)) {
           found = &n;
           break;
         }

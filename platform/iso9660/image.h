@@ -12,6 +12,7 @@
 #include <vector>
 
 #include "platform/blocksource.h"
+#include "platform/media_tree.h"
 
 namespace tvx::iso9660 {
 
@@ -68,8 +69,11 @@ class Image {
   // match first, then one that ignores ASCII letter case.
   int Resolve(std::string_view path, Node *out);
   // CheckExtents fails with ISO9660_ERR_CORRUPT when a file's data lies
-  // outside the image.
+  // outside the image, adds up past its size or overlaps itself.
   int CheckExtents(const Node &file) const;
+  // ReadNodeAt reads exactly `len` bytes at `offset` of a file's data.
+  int ReadNodeAt(const Node &file, uint64_t offset, void *buf, size_t len);
+  uint64_t Limit() const { return facts_.limit; }
   // ReadAt reads image bytes; ISO9660_ERR_IO when the source cannot.
   int ReadAt(uint64_t offset, void *buf, size_t len);
 
@@ -109,10 +113,8 @@ class FileReader {
   uint64_t pos_ = 0;
 };
 
-// ExtractTree writes the file at `path` into `destDir` under its own name, or
-// the contents of the directory at `path` into `destDir`.
-int ExtractTree(Image &image, std::string_view path, const char *destDir);
-// ExtractFileTo writes the file at `path` to the host path `target`.
-int ExtractFileTo(Image &image, std::string_view path, const char *target);
+// TreeSource over an open image for the shared walk and extractor
+// (platform/media_tree.h); media::ResultCode gives Iso9660Result numbers.
+std::unique_ptr<media::TreeSource> NewTreeSource(Image &image);
 
 }  // namespace tvx::iso9660

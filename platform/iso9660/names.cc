@@ -68,7 +68,7 @@ std::string ToUtf8(std::string_view bytes) {
   for (size_t i = 0; i < bytes.size();) {
     size_t n = Utf8SeqLen(bytes, i);
     if (n == 0) {
-      utf8::Append(static_cast<unsigned char>(bytes[i]), &out);
+      out += "\xEF\xBF\xBD";  // U+FFFD: the bytes name no character
       ++i;
     } else {
       out.append(bytes.substr(i, n));
@@ -85,12 +85,18 @@ std::string TruncateUtf8(const std::string &s, size_t max) {
   return s.substr(0, end);
 }
 
-std::string IsoName(std::string_view id) { return ToUtf8(DropVersion(id)); }
+std::string IsoName(std::string_view id) {
+  // A file identifier always holds the separator between name and extension
+  // (ECMA-119 7.5.1); without an extension it is no part of the name.
+  std::string_view name = DropVersion(id);
+  if (name.size() > 1 && name.back() == '.') name.remove_suffix(1);
+  return ToUtf8(name);
+}
 
 std::string JolietName(std::string_view id) {
   std::string out;
   const auto *p = reinterpret_cast<const uint8_t *>(id.data());
-  utf8::AppendUtf16(id.size() / 2, [p](size_t i) { return Be16(p + 2 * i); }, &out);
+  utf8::AppendUtf16(id.size() / 2, [p](size_t i) { return LoadBe16(p + 2 * i); }, &out);
   return std::string(DropVersion(out));
 }
 

@@ -11,14 +11,14 @@
 namespace tvx::iso9660 {
 
 // IsoName turns a d-character identifier into the entry name: the ";N"
-// version goes, everything else (including a trailing dot) stays. Bytes that
-// are not UTF-8 are taken as Latin-1.
+// version and the separator dot of a name without extension go. Bytes that
+// are not UTF-8 become U+FFFD.
 std::string IsoName(std::string_view id);
 // JolietName decodes a UCS-2/UTF-16 big-endian identifier to UTF-8 and drops
 // the ";N" version. An odd trailing byte is ignored; lone surrogates become
 // U+FFFD.
 std::string JolietName(std::string_view id);
-// ToUtf8 keeps valid UTF-8 and re-encodes anything else as Latin-1.
+// ToUtf8 keeps valid UTF-8 and turns every other byte into U+FFFD.
 std::string ToUtf8(std::string_view bytes);
 // TruncateUtf8 cuts `s` to at most `max` bytes without splitting a character.
 std::string TruncateUtf8(const std::string &s, size_t max);

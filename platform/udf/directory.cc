@@ -4,8 +4,9 @@
 // 4/14.4), each padded to four bytes, that may cross block boundaries, so the
 // whole directory is read first (bounded) and parsed from memory. Names are
 // OSTA CS0 and come back as UTF-8. A name that cannot be one component of a
-// "/" path (empty, ".", "..", or holding "/" or NUL) is left out of listings
-// and never matches, so no caller can be walked out of a tree by a name.
+// "/" path (empty, ".", "..", or holding "/" or NUL) is marked: it never
+// matches a lookup, and the extractor refuses a tree that holds one rather
+// than leave it out unseen.
 #include <algorithm>
 
 #include "platform/log.h"
@@ -24,11 +25,6 @@ constexpr size_t kFidImplUse = 38;
 constexpr uint8_t kFidDirectory = 0x02;
 constexpr uint8_t kFidDeleted = 0x04;
 constexpr uint8_t kFidParent = 0x08;
-
-bool UsableName(const std::string &name) {
-  return !name.empty() && name != "." && name != ".." &&
-         name.find('/') == std::string::npos && name.find('\0') == std::string::npos;
-}
 
 bool AllZero(const uint8_t *p, size_t n) {
   return std::all_of(p, p + n, [](uint8_t b) { return b == 0; });
@@ -61,7 +57,7 @@ Status ReadDirectory(Volume *vol, const Node &node, std::vector<DirEntry> *out) 
       return Status::kCorrupt;
     }
     size_t nameLen = f[kFidNameLength];
-    size_t implLen = Le16(f + kFidImplUseLength);
+    size_t implLen = LoadLe16(f + kFidImplUseLength);
     size_t used = kFidImplUse + implLen + nameLen;
     if (used > left) {
       Log("UDF: file identifier descriptor at offset %zu of a directory is cut short\n", pos);
@@ -71,12 +67,9 @@ Status ReadDirectory(Volume *vol, const Node &node, std::vector<DirEntry> *out) 
     uint8_t chars = f[kFidCharacteristics];
     if (chars & (kFidDeleted | kFidParent)) continue;
     DirEntry e;
-    if (!DecodeCs0(f + kFidImplUse + implLen, nameLen, &e.name) || !UsableName(e.name)) {
-      Log("UDF: skipping a directory entry whose name cannot be a path component\n");
-      continue;
-    }
+    e.usable = DecodeCs0(f + kFidImplUse + implLen, nameLen, &e.name) && media::SafeName(e.name);
     e.isDir = (chars & kFidDirectory) != 0;
-    e.icb = LbAddr{Le32(f + kFidIcb + 4), Le16(f + kFidIcb + 8)};
+    e.icb = LbAddr{LoadLe32(f + kFidIcb + 4), LoadLe16(f + kFidIcb + 8)};
     out->push_back(std::move(e));
   }
   return Status::kOk;
@@ -99,7 +92,7 @@ Status Lookup(Volume *vol, std::vector<LbAddr> *chain, const std::string &path, 
     st = ReadDirectory(vol, cur, &entries);
     if (st != Status::kOk) return st;
     auto it = std::find_if(entries.begin(), entries.end(),
-                           [&](const DirEntry &e) { return e.name == comp; });
+                           [&](const DirEntry &e) { return e.usable && e.name == comp; });
     if (it == entries.end()) return Status::kNotFound;
     Node next;
     st = vol->LoadNode(it->icb, &next);

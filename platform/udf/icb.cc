@@ -9,6 +9,7 @@
 #include <algorithm>
 #include <cstring>
 
+#include "platform/log.h"
 #include "platform/udf/udf_internal.h"
 
 namespace tvx::udf {
@@ -43,6 +44,7 @@ constexpr size_t kAedAds = 24;
 
 constexpr uint32_t kExtentLengthMask = 0x3FFFFFFF;
 constexpr uint32_t kExtentRecorded = 0;
+constexpr uint32_t kExtentAllocated = 1;  // allocated, not recorded: reads as zeros
 constexpr uint32_t kExtentNextAds = 3;
 
 size_t AdSize(int adType) {
@@ -63,28 +65,28 @@ Status Volume::LoadNode(LbAddr icb, Node *out) {
   for (;;) {
     Status st = ReadDescriptor(at, &buf, 0);
     if (st != Status::kOk) return st;
-    uint16_t id = Le16(buf.data());
+    uint16_t id = LoadLe16(buf.data());
     if (id == kTagFileEntry || id == kTagExtendedFileEntry) break;
     if (id != kTagIndirectEntry) return Status::kCorrupt;
     if (seen.size() >= kMaxIndirectEntries) return Status::kLoop;
     seen.push_back(at);
-    at = LbAddr{Le32(buf.data() + kIeIndirectIcb + 4), Le16(buf.data() + kIeIndirectIcb + 8)};
+    at = LbAddr{LoadLe32(buf.data() + kIeIndirectIcb + 4), LoadLe16(buf.data() + kIeIndirectIcb + 8)};
     if (std::find(seen.begin(), seen.end(), at) != seen.end()) return Status::kLoop;
   }
 
   const uint8_t *d = buf.data();
-  bool extended = Le16(d) == kTagExtendedFileEntry;
+  bool extended = LoadLe16(d) == kTagExtendedFileEntry;
   Node node;
   node.icb = at;
   node.fileType = d[kIcbFileType];
-  node.size = Le64(d + kEntryInfoLength);
-  uint64_t eaLen = Le32(d + (extended ? kEfeEaLength : kFeEaLength));
-  uint64_t adLen = Le32(d + (extended ? kEfeAdLength : kFeAdLength));
+  node.size = LoadLe64(d + kEntryInfoLength);
+  uint64_t eaLen = LoadLe32(d + (extended ? kEfeEaLength : kFeEaLength));
+  uint64_t adLen = LoadLe32(d + (extended ? kEfeAdLength : kFeAdLength));
   uint64_t adStart = (extended ? kEfeEa : kFeEa) + eaLen;
   if (adStart > buf.size() || adLen > buf.size() - adStart) return Status::kCorrupt;
   const uint8_t *ads = d + adStart;
 
-  int adType = Le16(d + kIcbFlags) & kAdTypeMask;
+  int adType = LoadLe16(d + kIcbFlags) & kAdTypeMask;
   if (adType == kAdEmbedded) {
     if (node.size > adLen) return Status::kCorrupt;
     node.embedded = true;
@@ -93,9 +95,10 @@ Status Volume::LoadNode(LbAddr icb, Node *out) {
     return Status::kOk;
   }
   if (AdSize(adType) == 0) return Status::kCorrupt;
-  uint64_t covered = 0;
+  uint64_t covered = 0, allocated = 0;
   std::vector<LbAddr> chain;
-  Status st = ParseAllocation(&node, ads, static_cast<size_t>(adLen), adType, &covered, &chain);
+  Status st = ParseAllocation(&node, ads, static_cast<size_t>(adLen), adType, &covered,
+                              &allocated, &chain);
   if (st != Status::kOk) return st;
   // Descriptors must account for every byte of the recorded size (sparse
   // parts included); a size beyond them would promise data that is nowhere.
@@ -105,25 +108,26 @@ Status Volume::LoadNode(LbAddr icb, Node *out) {
 }
 
 Status Volume::ParseAllocation(Node *node, const uint8_t *ads, size_t len, int adType,
-                               uint64_t *covered, std::vector<LbAddr> *chain) {
+                               uint64_t *covered, uint64_t *allocated,
+                               std::vector<LbAddr> *chain) {
   const size_t adSize = AdSize(adType);
   std::vector<uint8_t> aed;
   for (;;) {
     bool next = false;
     for (size_t pos = 0; len - pos >= adSize && *covered < node->size; pos += adSize) {
       const uint8_t *ad = ads + pos;
-      uint32_t raw = Le32(ad);
+      uint32_t raw = LoadLe32(ad);
       uint32_t length = raw & kExtentLengthMask;
       uint32_t type = raw >> 30;
       // A zero length ends the descriptors (ECMA-167 4/12).
       if (length == 0) return Status::kOk;
       LbAddr where;
       if (adType == kAdShort) {
-        where = LbAddr{Le32(ad + 4), node->icb.part};
+        where = LbAddr{LoadLe32(ad + 4), node->icb.part};
       } else if (adType == kAdLong) {
-        where = LbAddr{Le32(ad + 4), Le16(ad + 8)};
+        where = LbAddr{LoadLe32(ad + 4), LoadLe16(ad + 8)};
       } else {
-        where = LbAddr{Le32(ad + 12), Le16(ad + 16)};
+        where = LbAddr{LoadLe32(ad + 12), LoadLe16(ad + 16)};
       }
       if (type == kExtentNextAds) {
         if (chain->size() >= kMaxAllocExtents) return Status::kTooLarge;
@@ -131,7 +135,7 @@ Status Volume::ParseAllocation(Node *node, const uint8_t *ads, size_t len, int a
         chain->push_back(where);
         Status st = ReadDescriptor(where, &aed, kTagAllocExtent);
         if (st != Status::kOk) return st;
-        uint32_t aedLen = Le32(aed.data() + kAedAdLength);
+        uint32_t aedLen = LoadLe32(aed.data() + kAedAdLength);
         if (aedLen > aed.size() - kAedAds) return Status::kCorrupt;
         ads = aed.data() + kAedAds;
         len = aedLen;
@@ -139,6 +143,16 @@ Status Volume::ParseAllocation(Node *node, const uint8_t *ads, size_t len, int a
         break;
       }
       if (node->extents.size() >= kMaxExtentsPerFile) return Status::kTooLarge;
+      // Recorded and allocated extents occupy blocks of their partition
+      // (ECMA-167 4/14.14.1.1), so together they can neither leave it nor
+      // outgrow the image; only unallocated extents are free-standing holes.
+      if (type == kExtentRecorded || type == kExtentAllocated) {
+        if (!ExtentFits(where, length) || length > Capacity() - std::min(Capacity(), *allocated)) {
+          Log("UDF: an extent of a file lies outside its partition\n");
+          return Status::kCorrupt;
+        }
+        *allocated += length;
+      }
       Extent e;
       e.fileOffset = *covered;
       e.length = static_cast<uint32_t>(std::min<uint64_t>(length, node->size - *covered));
@@ -149,6 +163,33 @@ Status Volume::ParseAllocation(Node *node, const uint8_t *ads, size_t len, int a
     }
     if (!next) return Status::kOk;
   }
+}
+
+bool Volume::ExtentFits(LbAddr where, uint32_t length) const {
+  if (where.part >= parts_.size()) return false;
+  const Partition &p = parts_[where.part];
+  uint64_t blocks = (static_cast<uint64_t>(length) + blockSize_ - 1) / blockSize_;
+  switch (p.kind) {
+    case Partition::kPhysical:
+    case Partition::kSparable:
+      return where.lbn <= p.length && blocks <= p.length - where.lbn;
+    case Partition::kMetadata: {
+      uint64_t metaBlocks = p.metadataFile.size / blockSize_;
+      return where.lbn <= metaBlocks && blocks <= metaBlocks - where.lbn;
+    }
+    case Partition::kVirtual:
+      return where.lbn <= p.vat.size() && blocks <= p.vat.size() - where.lbn;
+  }
+  return false;
+}
+
+uint64_t Volume::Capacity() const {
+  if (sectors_ != 0) return sectors_ * blockSize_;
+  uint64_t end = 0;
+  for (const Partition &p : parts_) {
+    end = std::max(end, (static_cast<uint64_t>(p.start) + p.length) * blockSize_);
+  }
+  return end;
 }
 
 Status Volume::ReadNode(const Node &node, uint64_t offset, void *buf, size_t len) {

@@ -79,15 +79,15 @@ Status Volume::ParsePartitionMaps(const uint8_t *maps, size_t len, uint32_t coun
     Partition p;
     if (type == kMapType1 && mlen == kMapType1Len) {
       p.kind = Partition::kPhysical;
-      p.number = Le16(m + 4);
+      p.number = LoadLe16(m + 4);
     } else if (type == kMapType2 && mlen == kMapType2Len) {
-      p.number = Le16(m + kMapPartNumber);
+      p.number = LoadLe16(m + kMapPartNumber);
       if (IdentIs(m, "*UDF Sparable Partition")) {
         p.kind = Partition::kSparable;
       } else if (IdentIs(m, "*UDF Metadata Partition")) {
         p.kind = Partition::kMetadata;
-        pending.push_back({parts_.size(), Le32(m + kMetaFileLocation),
-                           Le32(m + kMetaMirrorLocation)});
+        pending.push_back({parts_.size(), LoadLe32(m + kMetaFileLocation),
+                           LoadLe32(m + kMetaMirrorLocation)});
       } else if (IdentIs(m, "*UDF Virtual Partition")) {
         p.kind = Partition::kVirtual;
         pending.push_back({parts_.size(), 0, 0});
@@ -133,9 +133,9 @@ Status Volume::ParsePartitionMaps(const uint8_t *maps, size_t len, uint32_t coun
 }
 
 Status Volume::LoadSparingTable(Partition *p, const uint8_t *map) {
-  p->packetLength = Le16(map + kSparPacketLength);
+  p->packetLength = LoadLe16(map + kSparPacketLength);
   uint8_t tables = map[kSparTableCount];
-  uint32_t size = Le32(map + kSparTableSize);
+  uint32_t size = LoadLe32(map + kSparTableSize);
   if (p->packetLength == 0 || tables == 0 || tables > 4 || size < kSpTableMap ||
       size > kMaxSparingTableSize) {
     Log("UDF: sparable partition %u has a bad sparing table description\n", p->number);
@@ -145,16 +145,16 @@ Status Volume::LoadSparingTable(Partition *p, const uint8_t *map) {
   // Every copy holds the same table; the first one that reads and validates
   // is used.
   for (uint8_t t = 0; t < tables; t++) {
-    uint32_t loc = Le32(map + kSparTableLocations + 4u * t);
+    uint32_t loc = LoadLe32(map + kSparTableLocations + 4u * t);
     if (ReadSectors(loc, 0, buf.data(), buf.size()) != Status::kOk) continue;
     if (CheckTag(buf.data(), buf.size(), 0, loc) != Status::kOk) continue;
     if (std::memcmp(buf.data() + kSpTableIdent, "*UDF Sparing Table", 18) != 0) continue;
-    uint32_t entries = Le16(buf.data() + kSpTableEntries);
+    uint32_t entries = LoadLe16(buf.data() + kSpTableEntries);
     if (kSpTableMap + 8ull * entries > size) continue;
     for (uint32_t e = 0; e < entries; e++) {
       const uint8_t *ent = buf.data() + kSpTableMap + 8u * e;
-      uint32_t original = Le32(ent);
-      if (original < kSpFirstReserved) p->sparing.emplace_back(original, Le32(ent + 4));
+      uint32_t original = LoadLe32(ent);
+      if (original < kSpFirstReserved) p->sparing.emplace_back(original, LoadLe32(ent + 4));
     }
     std::sort(p->sparing.begin(), p->sparing.end());
     return Status::kOk;
@@ -211,7 +211,7 @@ Status Volume::LoadVat(Partition *p, uint32_t lbn) {
   if (st != Status::kOk) return st;
   if (header != 0) {
     if (data.size() < kVatHeaderMin) return Status::kCorrupt;
-    header = Le16(data.data());
+    header = LoadLe16(data.data());
     if (header < kVatHeaderMin || header > data.size()) return Status::kCorrupt;
   } else if (std::memcmp(data.data() + data.size() - trailer + 1, "*UDF Virtual Alloc Tbl", 22) !=
              0) {
@@ -219,7 +219,7 @@ Status Volume::LoadVat(Partition *p, uint32_t lbn) {
   }
   size_t count = (data.size() - header - trailer) / 4;
   p->vat.resize(count);
-  for (size_t i = 0; i < count; i++) p->vat[i] = Le32(data.data() + header + 4 * i);
+  for (size_t i = 0; i < count; i++) p->vat[i] = LoadLe32(data.data() + header + 4 * i);
   return Status::kOk;
 }
 

@@ -54,12 +54,12 @@ Status CheckTag(const uint8_t *buf, size_t len, uint16_t want, uint32_t location
     if (i != 4) sum = static_cast<uint8_t>(sum + buf[i]);
   }
   if (sum != buf[4]) return Status::kCorrupt;
-  uint16_t id = Le16(buf);
+  uint16_t id = LoadLe16(buf);
   if (want != 0 && id != want) return Status::kCorrupt;
-  uint16_t crcLen = Le16(buf + 10);
+  uint16_t crcLen = LoadLe16(buf + 10);
   if (crcLen > len - kTagSize) return Status::kCorrupt;
-  if (Crc16(buf + kTagSize, crcLen) != Le16(buf + 8)) return Status::kCorrupt;
-  if (location != UINT32_MAX && Le32(buf + 12) != location) return Status::kCorrupt;
+  if (Crc16(buf + kTagSize, crcLen) != LoadLe16(buf + 8)) return Status::kCorrupt;
+  if (location != UINT32_MAX && LoadLe32(buf + 12) != location) return Status::kCorrupt;
   return Status::kOk;
 }
 

@@ -53,7 +53,7 @@ bool IsReadableFile(uint8_t fileType) {
 
 const DirEntry *FindEntry(const UDFDir *dir, const char *name) {
   for (const DirEntry &e : dir->entries) {
-    if (e.name == name) return &e;
+    if (e.usable && e.name == name) return &e;
   }
   return nullptr;
 }
@@ -112,12 +112,12 @@ TVX_EXPORT UDFDir *UDF_OpenDir(UDFVolume *volume, UDFDir *parent, const char *pa
 TVX_EXPORT const char *UDF_ReadDir(UDFDir *dir, int flags) {
   (void)flags;
   if (dir == nullptr) return nullptr;
-  if (dir->next >= dir->entries.size()) {
-    dir->last = nullptr;
-    return nullptr;
+  while (dir->next < dir->entries.size()) {
+    dir->last = &dir->entries[dir->next++];
+    if (dir->last->usable) return dir->last->name.c_str();
   }
-  dir->last = &dir->entries[dir->next++];
-  return dir->last->name.c_str();
+  dir->last = nullptr;
+  return nullptr;
 }
 
 TVX_EXPORT Bool UDF_DirEntryIsDir(UDFDir *dir) {
@@ -189,5 +189,28 @@ TVX_EXPORT Bool UDF_PReadFile(UDFFile *file, void *buffer, uint64_t offset, size
 }
 
 TVX_EXPORT void UDF_CloseFile(UDFFile *file) { delete file; }
+
+TVX_EXPORT int UDF_ListTree(UDFVolume *volume, const char *path, Bool recursive,
+                            UDFTreeCB callback, void *ctx) {
+  if (volume == nullptr || callback == nullptr) return UDF_TREE_ERR_ARGUMENT;
+  try {
+    auto tree = tvx::udf::NewTreeSource(volume->vol.get());
+    return tvx::media::ResultCode(
+        tvx::media::ListTree(*tree, path != nullptr ? path : "", recursive != 0, callback, ctx));
+  } catch (...) {
+    return UDF_TREE_ERR_IO;
+  }
+}
+
+TVX_EXPORT int UDF_Extract(UDFVolume *volume, const char *pathInImage, const char *destDir) {
+  if (volume == nullptr || destDir == nullptr || destDir[0] == '\0') return UDF_TREE_ERR_ARGUMENT;
+  try {
+    auto tree = tvx::udf::NewTreeSource(volume->vol.get());
+    return tvx::media::ResultCode(tvx::media::ExtractTree(
+        *tree, pathInImage != nullptr ? pathInImage : "", destDir));
+  } catch (...) {
+    return UDF_TREE_ERR_IO;
+  }
+}
 
 }  // extern "C"

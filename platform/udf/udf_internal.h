@@ -22,6 +22,8 @@
 #include <vector>
 
 #include "platform/blocksource.h"
+#include "platform/endian.h"
+#include "platform/media_tree.h"
 
 namespace tvx::udf {
 
@@ -74,18 +76,6 @@ enum TagId : uint16_t {
 };
 
 constexpr size_t kTagSize = 16;
-
-// Little-endian field reads; callers check bounds first.
-inline uint16_t Le16(const uint8_t *p) {
-  return static_cast<uint16_t>(static_cast<unsigned>(p[0]) | (static_cast<unsigned>(p[1]) << 8));
-}
-inline uint32_t Le32(const uint8_t *p) {
-  return static_cast<uint32_t>(p[0]) | (static_cast<uint32_t>(p[1]) << 8) |
-         (static_cast<uint32_t>(p[2]) << 16) | (static_cast<uint32_t>(p[3]) << 24);
-}
-inline uint64_t Le64(const uint8_t *p) {
-  return static_cast<uint64_t>(Le32(p)) | (static_cast<uint64_t>(Le32(p + 4)) << 32);
-}
 
 // Crc16 is the CRC of ECMA-167 3/7.2.6 (CRC-ITU-T, x^16+x^12+x^5+1, init 0).
 uint16_t Crc16(const uint8_t *data, size_t len);
@@ -170,6 +160,9 @@ class Volume {
   Status LoadNode(LbAddr icb, Node *out);
   // ReadNode reads exactly `len` bytes at `offset` of the node's data.
   Status ReadNode(const Node &node, uint64_t offset, void *buf, size_t len);
+  // Capacity is the size of the image in bytes, or, when the source cannot
+  // tell, the end of its furthest partition.
+  uint64_t Capacity() const;
 
  private:
   Status FindAnchor(uint32_t *mainLoc, uint32_t *mainLen, uint32_t *resLoc, uint32_t *resLen);
@@ -182,8 +175,9 @@ class Volume {
   Status LoadVat(Partition *p, uint32_t lbn);
   Status MapBlock(uint16_t part, uint32_t lbn, uint64_t *sector);
   Status ReadSectors(uint64_t sector, uint64_t offset, void *buf, size_t len);
+  bool ExtentFits(LbAddr where, uint32_t length) const;
   Status ParseAllocation(Node *node, const uint8_t *ads, size_t len, int adType,
-                         uint64_t *covered, std::vector<LbAddr> *chain);
+                         uint64_t *covered, uint64_t *allocated, std::vector<LbAddr> *chain);
 
   BlockSourcePtr src_;
   uint32_t blockSize_ = 2048;
@@ -207,11 +201,12 @@ class Volume {
 struct DirEntry {
   std::string name;  // UTF-8
   bool isDir = false;
+  bool usable = true;  // false: the name cannot be one path component
   LbAddr icb;
 };
 
-// ReadDirectory lists the directory `node`; parent and deleted entries and
-// names that cannot be a path component are left out.
+// ReadDirectory lists the directory `node`; parent and deleted entries are
+// left out, entries whose names cannot be a path component are marked.
 Status ReadDirectory(Volume *vol, const Node &node, std::vector<DirEntry> *out);
 
 // Lookup resolves `path` (components separated by "/") from the directory
@@ -219,5 +214,9 @@ Status ReadDirectory(Volume *vol, const Node &node, std::vector<DirEntry> *out);
 // On success `node` is the target and `chain` is extended through the
 // directories passed; the target is appended too.
 Status Lookup(Volume *vol, std::vector<LbAddr> *chain, const std::string &path, Node *node);
+
+// TreeSource over a mounted volume for the shared walk and extractor
+// (platform/media_tree.h).
+std::unique_ptr<media::TreeSource> NewTreeSource(Volume *vol);
 
 }  // namespace tvx::udf

@@ -40,7 +40,7 @@ constexpr size_t kFsdRootIcb = 400;
 
 constexpr uint32_t kBlockSizes[] = {2048, 512, 1024, 4096};
 
-LbAddr LongAdLocation(const uint8_t *ad) { return LbAddr{Le32(ad + 4), Le16(ad + 8)}; }
+LbAddr LongAdLocation(const uint8_t *ad) { return LbAddr{LoadLe32(ad + 4), LoadLe16(ad + 8)}; }
 
 }  // namespace
 
@@ -77,10 +77,10 @@ Status Volume::FindAnchor(uint32_t *mainLoc, uint32_t *mainLen, uint32_t *resLoc
       if (CheckTag(avdp, sizeof avdp, kTagAnchor, static_cast<uint32_t>(at)) != Status::kOk) {
         continue;
       }
-      *mainLen = Le32(avdp + kAvdpMainVds);
-      *mainLoc = Le32(avdp + kAvdpMainVds + 4);
-      *resLen = Le32(avdp + kAvdpReserveVds);
-      *resLoc = Le32(avdp + kAvdpReserveVds + 4);
+      *mainLen = LoadLe32(avdp + kAvdpMainVds);
+      *mainLoc = LoadLe32(avdp + kAvdpMainVds + 4);
+      *resLen = LoadLe32(avdp + kAvdpReserveVds);
+      *resLoc = LoadLe32(avdp + kAvdpReserveVds + 4);
       return Status::kOk;
     }
   }
@@ -102,20 +102,20 @@ Status Volume::ReadVds(uint32_t loc, uint32_t len) {
     // The sequence ends at a terminating descriptor or at the first block
     // that holds no valid descriptor (ECMA-167 3/8.4.2).
     if (CheckTag(buf.data(), buf.size(), 0, static_cast<uint32_t>(sector)) != Status::kOk) break;
-    uint16_t id = Le16(buf.data());
+    uint16_t id = LoadLe16(buf.data());
     if (id == kTagTerminating) break;
-    uint32_t seq = Le32(buf.data() + kVdSeqNumber);
+    uint32_t seq = LoadLe32(buf.data() + kVdSeqNumber);
     if (id == kTagVolumePointer) {
       if (++pointers > kMaxVdsPointers) return Status::kLoop;
-      len = Le32(buf.data() + kVdpNextExtent);
-      loc = Le32(buf.data() + kVdpNextExtent + 4);
+      len = LoadLe32(buf.data() + kVdpNextExtent);
+      loc = LoadLe32(buf.data() + kVdpNextExtent + 4);
       blocks = len / blockSize_;
       i = 0;
       continue;
     }
     if (id == kTagPartition) {
-      PdFacts pd{Le16(buf.data() + kPdNumber), Le32(buf.data() + kPdStart),
-                 Le32(buf.data() + kPdLength), seq};
+      PdFacts pd{LoadLe16(buf.data() + kPdNumber), LoadLe32(buf.data() + kPdStart),
+                 LoadLe32(buf.data() + kPdLength), seq};
       bool replaced = false;
       for (auto &old : pds_) {
         if (old.number != pd.number) continue;
@@ -154,18 +154,18 @@ Status Volume::Mount() {
   }
 
   const uint8_t *lvd = lvd_.data();
-  uint32_t lbs = Le32(lvd + kLvdBlockSize);
+  uint32_t lbs = LoadLe32(lvd + kLvdBlockSize);
   if (lbs != blockSize_) {
     Log("UDF: logical block size %u differs from the sector size %u\n", lbs, blockSize_);
     return Status::kUnsupported;
   }
   volumeId_ = DecodeDstring(lvd + kLvdIdentifier, kLvdIdentifierLen);
-  uint32_t mapLen = Le32(lvd + kLvdMapTableLength);
+  uint32_t mapLen = LoadLe32(lvd + kLvdMapTableLength);
   if (mapLen > lvd_.size() - kLvdMaps) {
     Log("UDF: partition map table of %u bytes does not fit its descriptor\n", mapLen);
     return Status::kCorrupt;
   }
-  st = ParsePartitionMaps(lvd + kLvdMaps, mapLen, Le32(lvd + kLvdMapCount));
+  st = ParsePartitionMaps(lvd + kLvdMaps, mapLen, LoadLe32(lvd + kLvdMapCount));
   if (st != Status::kOk) return st;
 
   LbAddr fsdAt = LongAdLocation(lvd + kLvdFsdLocation);

@@ -7,6 +7,7 @@
 set -euo pipefail
 out=${1:?usage: guess-medium.sh OUTDIR}
 SRC=${SRC:-$(cd "$(dirname "$0")/../.." && pwd)}
+. "$SRC/scripts/media/lib/mkimage.bash"
 dest="$out/guess-medium"
 mkdir -p "$dest"
 tmp=$(mktemp -d)
@@ -14,6 +15,7 @@ trap 'rm -rf "$tmp"' EXIT
 
 cp -r "$SRC/tests/data/guess-medium" "$tmp/tree"
 seq 1 3000 > "$tmp/tree/BIG.TXT"  # 13,893 bytes: seven sectors
-genisoimage -quiet -R -J -V GUESS_RR -o "$dest/rr.iso" "$tmp/tree"
-genisoimage -quiet -V GUESS_PLAIN -o "$dest/plain.iso" "$tmp/tree" 2>/dev/null
-genisoimage -quiet -R -J -udf -V GUESS_UDF -o "$dest/udf.iso" "$tmp/tree"
+t=$tmp/tree
+master "$dest/rr.iso" "$t" genisoimage -quiet -R -J -V GUESS_RR -o "$dest/rr.iso" "$t"
+master "$dest/plain.iso" "$t" genisoimage -quiet -V GUESS_PLAIN -o "$dest/plain.iso" "$t"
+master "$dest/udf.iso" "$t" genisoimage -quiet -R -J -udf -V GUESS_UDF -o "$dest/udf.iso" "$t"

@@ -10,6 +10,8 @@
 set -euo pipefail
 out=${1:?usage: iso9660.sh OUTDIR}/iso9660
 src=${SRC:-$(cd "$(dirname "$0")/../.." && pwd)}
+SRC=$src
+. "$SRC/scripts/media/lib/mkimage.bash"
 mkdir -p "$out"
 work=$(mktemp -d)
 trap 'rm -rf "$work"' EXIT
@@ -22,16 +24,12 @@ seq 1 9000 | sed 's/^/line /' > "$tree/docs/big.bin"
 # Fixed times keep the images reproducible between runs.
 find "$tree" -exec touch -h -d '2024-01-02 03:04:05 UTC' {} +
 
-run() {  # run TOOL ARGS...: quiet unless it fails
-  if ! "$@" >"$work/log" 2>&1; then
-    cat "$work/log" >&2
-    echo "iso9660.sh: failed: $*" >&2
-    exit 1
-  fi
+run() {  # run IMAGE TOOL ARGS...
+  master "$out/$1" "$tree" "${@:2}" -o "$out/$1" "$tree"
 }
 
-run xorriso -as mkisofs -R -J -V TVX_RR_JOLIET -o "$out/rr-joliet.iso" "$tree"
-run genisoimage -R -J -V TVX_RR_RELOC -o "$out/rr-relocated.iso" "$tree"
-run genisoimage -J -V TVX_JOLIET -o "$out/joliet-only.iso" "$tree"
-run genisoimage -iso-level 1 -V TVX_PLAIN_L1 -o "$out/plain-l1.iso" "$tree"
-run genisoimage -udf -R -J -V TVX_UDF_BRIDGE -o "$out/udf-bridge.iso" "$tree"
+run rr-joliet.iso xorriso -as mkisofs -R -J -V TVX_RR_JOLIET
+run rr-relocated.iso genisoimage -R -J -V TVX_RR_RELOC
+run joliet-only.iso genisoimage -J -V TVX_JOLIET
+run plain-l1.iso genisoimage -iso-level 1 -V TVX_PLAIN_L1
+run udf-bridge.iso genisoimage -udf -R -J -V TVX_UDF_BRIDGE

@@ -23,6 +23,7 @@
 set -euo pipefail
 out=${1:?usage: redhat.sh OUTDIR}/redhat
 SRC=${SRC:-$(cd "$(dirname "$0")/../.." && pwd)}
+. "$SRC/scripts/media/lib/mkimage.bash"
 data=$SRC/tests/data/redhat
 mkdir -p "$out"
 work=$(mktemp -d)
@@ -167,7 +168,7 @@ while IFS='|' read -r name release arch opts; do
   [ ${#variants[@]} -eq 0 ] || write_treeinfo "$tree/.treeinfo" "${variants[@]}"
   # Packages beside the perl builds, as on full media.
   [ -d "$tree/Packages" ] && printf 'rpm stand-in' >"$tree/Packages/bash-4.2.46-34.el7.x86_64.rpm"
-  genisoimage -quiet -R -J -joliet-long -V "$(echo "$name" | tr a-z- A-Z_ | cut -c1-32)" \
-    -o "$out/$name.iso" "$tree"
+  master "$out/$name.iso" "$tree" genisoimage -quiet -R -J -joliet-long \
+    -V "$(echo "$name" | tr a-z- A-Z_ | cut -c1-32)" -o "$out/$name.iso" "$tree"
   rm -rf "$tree"
 done <<<"$cases"

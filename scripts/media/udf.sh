@@ -17,6 +17,7 @@
 set -euo pipefail
 out=${1:?usage: udf.sh OUTDIR}/udf
 SRC=${SRC:-$(cd "$(dirname "$0")/../.." && pwd)}
+. "$SRC/scripts/media/lib/mkimage.bash"
 mkdir -p "$out"
 work=$(mktemp -d)
 trap 'rm -rf "$work"' EXIT
@@ -31,9 +32,10 @@ with open(sys.argv[1], "wb") as f:
         f.write(block)
 ' "$tree/sources/big.bin"
 
-genisoimage -quiet -udf -J -R -input-charset utf-8 -V UDFBRIDGE -o "$out/bridge.iso" "$tree"
+master "$out/bridge.iso" "$tree" \
+  genisoimage -quiet -udf -J -R -input-charset utf-8 -V UDFBRIDGE -o "$out/bridge.iso" "$tree"
 
-/usr/bin/python3 - "$tree" "$out/udf-only.iso" <<'EOF'
+master "$out/udf-only.iso" "$tree" /usr/bin/python3 - "$tree" "$out/udf-only.iso" <<'EOF'
 import os, sys
 import pycdlib
 src, dst = sys.argv[1], sys.argv[2]
@@ -62,16 +64,14 @@ EOF
 
 for rev in 1.02 1.50 2.00 2.01 2.50 2.60; do
   img="$out/empty-${rev/./}.img"
-  rm -f "$img"
   case $rev in
     2.50|2.60) media=bdr ;;
     *) media=hd ;;
   esac
-  mkudffs --new-file --media-type=$media --udfrev=$rev --label="EMPTY${rev/./}" "$img" 4096 \
-    >/dev/null
+  master "$img" "" mkudffs --new-file --media-type=$media --udfrev=$rev --label="EMPTY${rev/./}" \
+    "$img" 4096
 done
-rm -f "$out/empty-sparable.img" "$out/empty-vat150.img"
-mkudffs --new-file --media-type=cdrw --udfrev=2.01 --label=EMPTYSPAR "$out/empty-sparable.img" 3000 \
-  >/dev/null
-mkudffs --new-file --media-type=cdr --udfrev=1.50 --label=EMPTYVAT15 "$out/empty-vat150.img" 1000 \
-  >/dev/null
+master "$out/empty-sparable.img" "" mkudffs --new-file --media-type=cdrw --udfrev=2.01 \
+  --label=EMPTYSPAR "$out/empty-sparable.img" 3000
+master "$out/empty-vat150.img" "" mkudffs --new-file --media-type=cdr --udfrev=1.50 \
+  --label=EMPTYVAT15 "$out/empty-vat150.img" 1000

@@ -8,6 +8,7 @@
 set -euo pipefail
 out=${1:?usage: windows-legacy.sh OUTDIR}
 SRC=${SRC:-$(cd "$(dirname "$0")/../.." && pwd)}
+. "$SRC/scripts/media/lib/mkimage.bash"
 data="$SRC/tests/data/windows-legacy"
 dest="$out/windows-legacy"
 mkdir -p "$dest"
@@ -51,5 +52,6 @@ for row in "${images[@]}"; do
     udf) opts=(-R -J -udf) ;;
     *) echo "windows-legacy.sh: unknown format $format" >&2; exit 1 ;;
   esac
-  genisoimage -quiet "${opts[@]}" -V "$volid" -o "$dest/$name.iso" "$tree"
+  master "$dest/$name.iso" "$tree" \
+    genisoimage -quiet "${opts[@]}" -V "$volid" -o "$dest/$name.iso" "$tree"
 done

@@ -23,6 +23,7 @@
 set -euo pipefail
 out=${1:?usage: windows.sh OUTDIR}/windows
 SRC=${SRC:-$(cd "$(dirname "$0")/../.." && pwd)}
+. "$SRC/scripts/media/lib/mkimage.bash"
 data=$SRC/tests/data/windows
 mkdir -p "$out"
 work=$(mktemp -d)
@@ -159,12 +160,13 @@ appx_manifest() {  # FILE WITH_SKYPE
 label() { basename "$1" .iso | tr a-z- A-Z_ | cut -c1-32; }
 
 master_bridge() {  # TREE IMAGE
-  genisoimage -quiet -udf -iso-level 3 -J -joliet-long -R -V "$(label "$2")" -o "$2" "$1"
+  master "$2" "$1" genisoimage -quiet -udf -iso-level 3 -J -joliet-long -R -V "$(label "$2")" \
+    -o "$2" "$1"
 }
 
 # UDF alone carries the tree; the ISO 9660 side holds only README.TXT.
 master_udf_only() {  # TREE IMAGE
-  /usr/bin/python3 - "$1" "$2" "$(label "$2")" <<'PY'
+  master "$2" "$1" /usr/bin/python3 - "$1" "$2" "$(label "$2")" <<'PY'
 import io, os, sys
 import pycdlib
 tree, image, label = sys.argv[1], sys.argv[2], sys.argv[3]

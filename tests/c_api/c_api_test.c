@@ -3,6 +3,11 @@
 #define _POSIX_C_SOURCE 200809L /* mkstemp, fdopen */
 #include "tvx_all_headers.h"
 
+/* OpenSSL's declarations after ours (c_api_openssl_first.c has the other
+ * order): both must agree. */
+#include <openssl/pkcs7.h>
+#include <openssl/x509_vfy.h>
+
 #include <stdio.h>
 #include <stdlib.h>
 #include <string.h>
@@ -183,6 +188,37 @@ static void TestIso9660(void) {
   CHECK(sizeof(((Iso9660DirEntry *)0)->name) == 256);
 }
 
+/* Builds a VM configuration through the exported dictionary calls and asks
+ * for a tools status that needs no file: mode 5 is never applicable, and a
+ * guest that reported no tools with legacy number 0 has none. */
+static void TestToolsVersion(void) {
+  Dictionary *config = Dictionary_Create();
+  char *value;
+  ToolsVersionReport *report = NULL;
+  phase = "toolsversion";
+  CHECK(Dict_SetString(config, "winXPPro", "%s", "guestOS"));
+  CHECK(!Dict_SetString(config, "x", "bad name"));
+  value = Dict_GetString(config, NULL, "guestOS");
+  CHECK(value != NULL && strcmp(value, "winXPPro") == 0);
+  free(value);
+  value = Dict_GetString(config, "dflt", "libdir");
+  CHECK(value != NULL && strcmp(value, "dflt") == 0);
+  free(value);
+  CHECK(!Dictionary_LoadEx(config, "/nonexistent/tvx-vm.tvx", NULL));
+  CHECK(ToolsVersion_GetStatus("/nonexistent/vm.tvx", config, NULL, "", 10252, 5) ==
+        TOOLS_STATUS_NOT_APPLICABLE);
+  CHECK(ToolsVersion_GetStatusReport("/nonexistent/vm.tvx", config, NULL, "", 0, 0, &report) ==
+        TOOLS_STATUS_NOT_INSTALLED);
+  CHECK(report != NULL && report->status == TOOLS_STATUS_NOT_INSTALLED && !report->evaluated);
+  ToolsVersion_FreeReport(report);
+  CHECK(ToolsVersion_SaveXmlInfo("/nonexistent/vm.tvx", NULL, NULL, 3, 0));
+  CHECK(!ToolsVersion_SaveXmlInfo("/nonexistent/vm.tvx", "null", NULL, 3, 1));
+  CHECK(strcmp(ToolsVersion_ComponentStatusText(TOOLS_COMPONENT_MISSING),
+               "missing from the guest") == 0);
+  CHECK(strcmp(ToolsVersion_StatusName(42), "TOOLS_STATUS_INVALID") == 0);
+  Dictionary_Free(config);
+}
+
 static void TestGuess(void) {
   phase = "guess";
   GuessResult r;
@@ -200,6 +236,41 @@ static void TestGuess(void) {
   CHECK(Guess_ELF_Arch(elf, sizeof elf) == GUESS_ELF_ARCH_X86_64);
 }
 
+/* Signature and hash-data calls that need no PKI. */
+static void TestSignature(void) {
+  char *err = NULL;
+  PKCS7 *p7 = NULL;
+  uint8_t header[600] = {0};
+  phase = "signature";
+  CHECK(strcmp(ZelSign_StatusToString(7), "Error") == 0);
+  CHECK(!ZelSign_IsTrxSignatureValid(p7, "x", 0, NULL, (X509_STORE *)NULL, &err));
+  CHECK(err != NULL && strcmp(err, "Data buffer too small.") == 0);
+  free(err);
+  CHECK(ToolsISO_GetHashImpl("SHA-256") != NULL);
+  CHECK(ToolsISO_ParseHashData(header, sizeof header) == NULL);
+  CHECK(!ToolsISO_VerifySignature(NULL, "x", 1, "y", 1));
+  ToolsISO_FreeHashInfo(NULL);
+}
+
+static void TestToolsImage(void) {
+  ToolsIsoLocalFile *local = NULL;
+  ToolsIsoHashInfo *info = NULL;
+  ToolsIsoImageInfo imageInfo;
+  char *path = NULL;
+  phase = "tools_image";
+  CHECK(ToolsISO_ValidateName("linux.iso"));
+  CHECK(!ToolsISO_ValidateName("../linux.iso"));
+  CHECK(ToolsISO_GetImageBaseName(20510) != NULL);
+  CHECK(ToolsISO_GetRefreshCount() >= 1);
+  CHECK(!ToolsISO_GetImagePath("/nonexistent/tvx-tools", "rhel6", NULL, TRUE, &path, NULL, NULL));
+  CHECK(path == NULL);
+  CHECK(ToolsISO_LocalFileOpen("/nonexistent/tvx-tools.iso", FALSE, &local) == TOOLSISO_OPEN_IO_ERROR);
+  CHECK(local == NULL);
+  CHECK(ToolsISO_GetLocalFileHashInfo("/nonexistent/tvx-tools.iso", 1, FALSE, &info));
+  CHECK(info == NULL);
+  CHECK(!ToolsISO_GetImageInfo(NULL, &imageInfo));
+}
+
 /* Linux install media: what needs a floppy, and calls that need no files. */
 static void TestLinuxMedia(void) {
   phase = "linux media";
@@ -215,13 +286,16 @@ static void TestLinuxMedia(void) {
 int main(void) {
   TestBase();
   TestGuess();
+  TestToolsVersion();
   TestIso9660();
   TestUdf();
   TestIni();
   TestAutoInstall();
   TestWindowsAnswers();
+  TestSignature();
   TestFloppy();
   TestLinuxAnswers();
+  TestToolsImage();
   TestLinuxMedia();
   if (failures == 0) printf("c_api: all phases passed\n");
   return failures == 0 ? 0 : 1;

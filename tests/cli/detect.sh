@@ -1,6 +1,7 @@
 #!/usr/bin/env bash
-# tvxguest detect: the JSON contract on every test image, exit statuses,
-# and the error line for images that cannot be opened.
+# tvxguest detect: the JSON contract on every test image (one batch process),
+# what a person sees, exit statuses, and the error lines for images that
+# cannot be opened.
 set -uo pipefail
 tool=${TVX_TOOL:?} media=${TVX_MEDIA_DIR:?}
 fail=0
@@ -11,59 +12,80 @@ check() {  # check WHAT COND...
 tmp=$(mktemp -d)
 trap 'rm -rf "$tmp"' EXIT
 
-# Every key, with its type, and the exit status equal to "result".
-validate='
-import json, sys
-want = {"result": int, "guestOS": (str, type(None)), "guestOSOverride": (str, type(None)),
-        "version": int, "versionName": str, "noIsolinuxConfig": bool, "versionText": str,
-        "language": str, "languageShort": str, "languages": str, "editions": str,
-        "displayName": str, "displayText": str}
-o = json.load(open(sys.argv[1]))
-assert set(o) == set(want), sorted(set(o) ^ set(want))
-for k, t in want.items():
-    assert isinstance(o[k], t), k
-assert o["result"] == int(sys.argv[2]), (o["result"], sys.argv[2])
-assert (o["result"] == 0) == (o["guestOS"] is not None)
-assert o["versionName"].startswith("GUESS_VERSION_")
-'
-count=0
-while IFS= read -r -d '' img; do
-  "$tool" detect --json "$img" >"$tmp/out.json" 2>"$tmp/err"
-  rc=$?
-  name=${img#"$media"/}
-  check "$name: exit $rc, JSON contract" \
-    /usr/bin/python3 -c "$validate" "$tmp/out.json" "$rc"
-  count=$((count + 1))
-done < <(find "$media" -name '*.iso' -print0 | sort -z)
-check "found test images ($count)" test "$count" -gt 0
-
-field() {  # field IMAGE KEY
-  "$tool" detect --json "$media/$1" 2>/dev/null |
-    /usr/bin/python3 -c "import json,sys; print(json.load(sys.stdin)['$2'])"
-}
-check "winxppro guestOS" test "$(field windows-legacy/winxppro.iso guestOS)" = winXPPro
-check "winxppro language" test "$(field windows-legacy/winxppro.iso language)" = German
-check "win2003std-x64 displayText" \
-  test "$(field windows-legacy/win2003std-x64.iso displayText)" = winNetStandard-64
-
-"$tool" detect "$media/windows-legacy/win95.iso" >"$tmp/human"
-check "human output names image and guest" grep -q 'win95.iso: win95$' "$tmp/human"
-
-"$tool" detect "$tmp/missing.iso" >"$tmp/out" 2>"$tmp/err"
-rc=$?
-check "missing image: exit 2" test "$rc" -eq 2
-check "missing image: one error line naming it" \
-  test "$(wc -l <"$tmp/err")" -eq 1 -a -n "$(grep -F "$tmp/missing.iso" "$tmp/err")"
+# Every image of the shelf, then a missing file and noise: the two that fail
+# are reported and the run goes on.
 head -c 100000 /dev/urandom >"$tmp/noise.iso"
-"$tool" detect --json "$tmp/noise.iso" >"$tmp/out.json" 2>"$tmp/err"
-rc=$?
-check "noise: exit 2 and JSON result 2" /usr/bin/python3 -c "$validate" "$tmp/out.json" "$rc"
-check "noise: one error line naming it" grep -qF "noise.iso" "$tmp/err"
+"$tool" detect --json -r "$media" "$tmp/missing.iso" "$tmp/noise.iso" >"$tmp/all.jsonl" 2>"$tmp/err"
+check "batch with unopenable images: exit 2" test $? -eq 2
+check "one error line for each unopenable image" \
+  test "$(grep -cF -e "'$tmp/missing.iso'" -e "'$tmp/noise.iso'" "$tmp/err")" -eq 2 -a \
+  "$(wc -l <"$tmp/err")" -eq 2
+images=$(find "$media" -type f \( -name '*.iso' -o -name '*.img' -o -name '*.udf' \) | wc -l)
+check "one record per image ($images + 2)" test "$(wc -l <"$tmp/all.jsonl")" -eq $((images + 2))
 
-"$tool" detect >/dev/null 2>&1
-check "no IMAGE: usage error 64" test $? -eq 64
-"$tool" detect --bogus x.iso >/dev/null 2>&1
-check "unknown option: usage error 64" test $? -eq 64
-check "--help" "$tool" detect --help
+/usr/bin/python3 - "$tmp/all.jsonl" "$media/" "$tmp/" <<'PY' || fail=1
+import json, sys
+types = {"path": str, "result": int, "guestOS": (str, type(None)),
+         "guestOSOverride": (str, type(None)), "version": int, "versionName": str,
+         "noIsolinuxConfig": bool, "versionText": str, "language": str,
+         "languageShort": str, "languages": str, "editions": str, "displayName": str,
+         "displayText": str}
+# What a person or a script reads off particular media.
+expect = {
+    "windows-legacy/winxppro.iso": {"guestOS": "winXPPro", "language": "German"},
+    "windows-legacy/win2003std-x64.iso": {"displayText": "winNetStandard-64"},
+    "windows/win81-x64.iso": {"displayText": "Windows 8.1 x64"},
+    "windows/server2012r2.iso": {"displayText": "Windows Server 2012 R2"},
+    "windows/win10-esd-x86.iso": {"versionName": "GUESS_VERSION_WINDOWS_10_ESD"},
+    "windows/winmain-client.iso": {"result": 1},
+    "redhat/centos7.iso": {"guestOS": "centos7-64", "versionName": "GUESS_VERSION_CENTOS_7"},
+    "redhat/fedora35-aarch64.iso": {"noIsolinuxConfig": True},
+    "redhat/ppc64.iso": {"result": 1, "language": "en-US"},
+    "missing.iso": {"result": 2},
+    "noise.iso": {"result": 2},
+}
+bad, seen = 0, {}
+for line in open(sys.argv[1]):
+    o = json.loads(line)
+    name = o["path"].removeprefix(sys.argv[2]).removeprefix(sys.argv[3])
+    problems = sorted(set(o) ^ set(types))
+    problems += [k for k, t in types.items() if k in o and not isinstance(o[k], t)]
+    if (o["result"] == 0) != (o["guestOS"] is not None):
+        problems.append("result/guestOS")
+    if not o["versionName"].startswith("GUESS_VERSION_"):
+        problems.append("versionName")
+    problems += ["%s=%r" % (k, o.get(k)) for k, v in expect.get(name, {}).items() if o.get(k) != v]
+    seen[name] = o
+    if problems:
+        bad = 1
+        print("FAIL: %s: %s" % (name, ", ".join(problems)))
+missing = sorted(set(expect) - set(seen))
+if missing:
+    bad = 1
+    print("FAIL: no record for", missing)
+print("ok: JSON contract on %d records" % len(seen) if not bad else "FAIL: JSON contract")
+sys.exit(bad)
+PY
+
+# One IMAGE: the details, as before batches existed.
+"$tool" detect "$media/windows/server2019.iso" >"$tmp/human"
+check "one image: human output lists the editions" \
+  grep -q 'Windows Server 2019 SERVERDATACENTER' "$tmp/human"
+"$tool" detect "$tmp/missing.iso" >"$tmp/out" 2>"$tmp/err"
+check "one missing image: exit 2, nothing on stdout, one error line" \
+  test $? -eq 2 -a ! -s "$tmp/out" -a "$(wc -l <"$tmp/err")" -eq 1
+# Several: one line each, exit 1 when one is not recognised.
+"$tool" detect "$media/windows-legacy/win95.iso" "$media/windows/winmain-client.iso" >"$tmp/human"
+check "batch not recognised: exit 1" test $? -eq 1
+check "batch: a line per image" test "$(cat "$tmp/human")" = \
+  "$media/windows-legacy/win95.iso: win95
+$media/windows/winmain-client.iso: not recognised"
+
+for bad in "" "--bogus x.iso" "-r"; do
+  # shellcheck disable=SC2086
+  "$tool" detect $bad >/dev/null 2>&1
+  check "usage error 64: detect $bad" test $? -eq 64
+done
+check "--help" bash -c '"$0" detect --help >/dev/null' "$tool"
 
 exit $fail

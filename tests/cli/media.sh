@@ -24,8 +24,9 @@ check "ls names the reader and the volume" [ "$first" = 'iso9660 (rock ridge) vo
 check "ls marks directories" bash -c "'$tool' media ls '$media/rr-joliet.iso' | grep -qx '           -  docs/'"
 check "ls -R shows nested files with sizes" \
   bash -c "'$tool' media ls -R '$media/rr-joliet.iso' docs | grep -qx '       88893  big.bin'"
-plain=$("$tool" media ls "$media/plain-l1.iso" | grep -c 'KERNEL\.$')
-check "ls keeps the dot of a level-1 name" [ "$plain" = 1 ]
+plain=$("$tool" media ls "$media/plain-l1.iso" | grep -c ' KERNEL$')
+check "ls drops the dot of a level-1 name without extension" [ "$plain" = 1 ]
+check "cat finds that name without its dot" status 0 "$tool" media cat "$media/plain-l1.iso" KERNEL
 bridge=$("$tool" media ls "$media/udf-bridge.iso" | head -1)
 check "a bridge image opens as UDF first" [ "${bridge%% *}" = udf ]
 forced=$("$tool" media ls --iso9660 "$media/udf-bridge.iso" | head -1)
@@ -49,6 +50,15 @@ check "extract of a file lands under its own name" \
   bash -c "'$tool' media extract '$media/rr-joliet.iso' isolinux/isolinux.cfg '$work/one' && cmp -s '$work/one/isolinux.cfg' '$src/tests/data/iso9660/tree/isolinux/isolinux.cfg'"
 
 check "missing image: status 2" status 2 "$tool" media ls "$work/none.iso"
+check "missing image: the system's reason" \
+  bash -c "'$tool' media ls '$work/none.iso' 2>&1 | grep -q 'No such file or directory'"
+mkfifo "$work/fifo"
+check "a FIFO is refused without waiting" status 2 timeout 20 "$tool" media ls "$work/fifo"
+check "cat to a full disk: status 1" \
+  bash -c "'$tool' media cat '$media/rr-joliet.iso' docs/big.bin >/dev/full 2>/dev/null; [ \$? -eq 1 ]"
+check "ls to a full disk: status 1" bash -c "! '$tool' media ls -R '$media/rr-joliet.iso' >/dev/full 2>/dev/null"
+check "ls of a file names it once" \
+  bash -c "'$tool' media ls '$media/rr-joliet.iso' docs/big.bin 2>&1 >/dev/null | grep -c docs/big.bin | grep -qx 1"
 check "missing path: status 1" status 1 "$tool" media cat "$media/rr-joliet.iso" no/such
 check "missing directory: status 1" status 1 "$tool" media ls "$media/rr-joliet.iso" nodir
 check "unknown subcommand: status 64" status 64 "$tool" media rm x

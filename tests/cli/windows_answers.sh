@@ -19,8 +19,8 @@ tpl=$src/data/windows
 win10=$media/windows/win10-x64.iso
 winxp=$media/windows-legacy/winxppro.iso
 linux=$media/redhat/rhel5-server-x64.iso
-name='Jo & <Ann> "O'"'"'Neil" Jürgen'
-password='p&ss<w>rd'
+name='Jo & O'"'"'Neil Jürgen'
+password='p&ss<w>"rd'  # quotes are fine in the XML, not in winnt.sif
 
 answers() {  # answers OUTDIR IMAGE EXTRA...
   local out=$1 img=$2; shift 2
@@ -36,7 +36,9 @@ el() { printf "*[local-name()='%s']" "$1"; }
 oobe="//$(el settings)[@pass='oobeSystem']/$(el component)[@name='Microsoft-Windows-Shell-Setup']"
 
 if usable "$win10"; then
-  answers "$tmp/w10" "$win10" --image-name "Windows 10 Pro" --password "$password" \
+  # A planted link where an answer file goes is replaced, never written through.
+  mkdir -p "$tmp/w10" && echo keep >"$tmp/victim" && ln -s "$tmp/victim" "$tmp/w10/winnt.sif"
+  answers "$tmp/w10" "$win10" --image-name "Windows 10 Pro" --password "${password//\"/}" \
     --product-key AAAAA-BBBBB-CCCCC-DDDDD-EEEEE >"$tmp/out" 2>"$tmp/err"
   check "win10: exit 0" test $? -eq 0
   check "win10: names the three files" test "$(grep -c '^wrote ' "$tmp/out")" -eq 3
@@ -45,14 +47,26 @@ if usable "$win10"; then
   check "win10: account name intact" \
     test "$(xpath "$xml" "$oobe/$(el AutoLogon)/$(el Username)")" = "$name"
   check "win10: password intact" \
-    test "$(xpath "$xml" "$oobe/$(el AutoLogon)/$(el Password)/$(el Value)")" = "$password"
+    test "$(xpath "$xml" "$oobe/$(el AutoLogon)/$(el Password)/$(el Value)")" = "${password//\"/}"
+  check "win10: planted link untouched" test "$(cat "$tmp/victim")" = keep -a ! -L "$tmp/w10/winnt.sif"
+  check "win10: files private" test "$(stat -c %a "$tmp/w10/winnt.sif" "$xml" "$tmp/w10/storePwd.ini" | sort -u)" = 600
   check "win10: host time zone" \
     test "$(xpath "$xml" "$oobe/$(el TimeZone)")" = "Tokyo Standard Time"
   check "win10: four first-logon commands" \
     test "$(xpath "$xml" "count($oobe/$(el FirstLogonCommands)/*)")" = 4
   check "win10: winnt.sif time-zone index" grep -qx 'TimeZone=235' "$tmp/w10/winnt.sif"
   check "win10: winnt.sif name in windows-1252" \
-    grep -q "^FullName=\"Jo & <Ann> \"O'Neil\" J$(printf '\374')rgen\"" "$tmp/w10/winnt.sif"
+    grep -q "^FullName=\"Jo & O'Neil J$(printf '\374')rgen\"" "$tmp/w10/winnt.sif"
+
+  # Texts that would add keys to winnt.sif are refused before anything is
+  # written: exit 1, the character named, nothing new in --out.
+  for bad in "--password=$password" $'--password=pw\rAutoLogon=Yes' $'--product-key=K\rX=1' \
+      $'--full-name=Bob\nX' "--full-name=$(printf 'n%.0s' {1..60})"; do
+    answers "$tmp/inj" "$win10" --image-name "Windows 10 Pro" "$bad" >/dev/null 2>"$tmp/err"
+    check "refused ${bad%%=*}: exit 1" test $? -eq 1
+    check "refused ${bad%%=*}: reason" grep -qE 'holds|longer than' "$tmp/err"
+    check "refused ${bad%%=*}: nothing written" test ! -e "$tmp/inj"
+  done
 
   answers "$tmp/w10j" "$win10" --image-name "Windows 10 Pro" --json >"$tmp/json" 2>&1
   check "win10 --json: result and files" /usr/bin/python3 -c '
@@ -67,8 +81,8 @@ assert [f.rsplit("/", 1)[1] for f in o["files"]] == ["winnt.sif", "autoun~0.xml"
     --full-name y --out "$tmp/bad" "$win10" >/dev/null 2>"$tmp/err"
   check "missing template: exit 1" test $? -eq 1
   check "missing template: reason shown" grep -qF \
-    "AutoInstall_PrepareAnswerFileEx: File_Copy from=\"$tmp/absent.xml\" to=\"$tmp/bad/autoun~0.xml\"" \
-    "$tmp/err"
+    "AutoInstall_PrepareAnswerFileEx: File_Copy from=\"$tmp/absent.xml\"" "$tmp/err"
+  check "missing template: nothing left behind" test -z "$(ls -A "$tmp" | grep -e bad -e staging)"
 else
   echo "skip: $win10 not mastered or not recognised"
 fi

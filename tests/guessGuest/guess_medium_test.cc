@@ -4,27 +4,17 @@
 #include <set>
 #include <string>
 
-#include "lib/guessGuest/guess_internal.h"
-#include "support/log_capture.h"
+#include "guessGuest/media_table.h"
 
 namespace {
 
 using tvx::guess::Text;
 
 // Opens one of the guess-medium images (rr, plain, udf) for a test.
-class Medium {
+class Medium : public tvxtest::OpenedMedium {
  public:
-  explicit Medium(const std::string &image) {
-    std::string path = tvxtest::MediaDir() + "/guess-medium/" + image + ".iso";
-    opened_ = tvx::guess::OpenMedium(path.c_str(), &medium_);
-  }
-  ~Medium() { tvx::guess::CloseMedium(&medium_); }
-  bool opened() const { return opened_; }
-  GuessMedium *get() { return &medium_; }
-
- private:
-  GuessMedium medium_{};
-  bool opened_ = false;
+  explicit Medium(const std::string &image) : OpenedMedium("guess-medium/" + image) {}
+  bool opened() const { return ok(); }
 };
 
 std::string SeqText(int n) {

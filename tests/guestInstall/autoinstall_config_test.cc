@@ -8,6 +8,8 @@
 #include "lib/guestInstall/autoinstall_internal.h"
 #include "tvx_autoinstall.h"
 
+using namespace tvx::autoinstall;
+
 namespace {
 
 GuessResult Guess(const char *guestOS, uint32_t version = GUESS_VERSION_UNKNOWN,

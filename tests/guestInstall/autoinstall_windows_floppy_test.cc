@@ -7,6 +7,7 @@
 
 #include "support/fat_oracle.h"
 #include "support/log_capture.h"
+#include "support/test_pki.h"
 #include "tvx_floppy.h"
 
 namespace {

@@ -39,8 +39,8 @@ struct Answers {
   std::string xml = Template("autounattend.xml");
   std::string storePwd = Template("storePwd.ini");  // empty: no storePwd.ini
   const char *productKey = "AAAAA-BBBBB-CCCCC-DDDDD-EEEEE";
-  const char *fullName = "Jo & <Ann> \"O'Neil\" J\xC3\xBCrgen";
-  const char *password = "p&ss<w>rd\"'";
+  const char *fullName = "Jo & <Ann> O'Neil J\xC3\xBCrgen";
+  const char *password = "p&ss<w>rd'";
   const char *guestOS = "windows9-64";
   GuessVersion version = GUESS_VERSION_WINDOWS_10_PLAIN;
   const char *language = nullptr;
@@ -199,7 +199,7 @@ TEST_F(WindowsAnswers, UserAnswersArriveEscapedAndIntact) {
             "1");
 
   // winnt.sif holds the same answers, quoted, in windows-1252, and the zone's index.
-  EXPECT_EQ(Sif("UserData", "FullName"), "Jo & <Ann> \"O'Neil\" J\xFCrgen");
+  EXPECT_EQ(Sif("UserData", "FullName"), "Jo & <Ann> O'Neil J\xFCrgen");
   EXPECT_EQ(Sif("GuiUnattended", "AdminPassword"), a.password);
   EXPECT_EQ(Sif("GuiUnattended", "AutoLogon"), "Yes");
   EXPECT_EQ(Sif("GuiUnattended", "AutoLogonCount"), "1");
@@ -360,7 +360,7 @@ TEST_F(WindowsAnswers, FailuresLogTheirStepAndStop) {
        [](Answers &a, const std::string &s, auto &, auto &, auto &) {
          a.sif = s, a.productKey = "", a.fullName = "";
        },
-       "IniUtil_WriteIniFileString unattendFilePath=\"" + sif + "\", AdminPassword=\"p&ss<w>rd\"'\"\n",
+       "IniUtil_WriteIniFileString unattendFilePath=\"" + sif + "\", AdminPassword=\"p&ss<w>rd'\"\n",
        {"autoun~0.xml", "storePwd.ini", "winnt.sif"}},
       {"time zone not written",
        [](Answers &a, const std::string &s, auto &, auto &, auto &) {
@@ -377,10 +377,33 @@ TEST_F(WindowsAnswers, FailuresLogTheirStepAndStop) {
        [](Answers &a, auto &, auto &, const std::string &x, auto &) { a.xml = x; },
        "AutoInstallEditUnattendXml failed for \"" + xml + "\"\n",
        {"autoun~0.xml", "storePwd.ini", "winnt.sif"}},
-      {"name XML cannot hold",
-       [](Answers &a, auto &, auto &, auto &, auto &) { a.fullName = "tab\tok but bell\a not"; },
+      {"image name XML cannot hold",
+       [](Answers &a, auto &, auto &, auto &, auto &) { a.imageName = "Windows\a10"; },
        "AutoInstallEditUnattendXml failed for \"" + xml + "\"\n",
        {"autoun~0.xml", "storePwd.ini", "winnt.sif"}},
+      // Texts that could add a key or a section to winnt.sif, or come back
+      // cut or clipped, are refused before any file is made.
+      {"password with a line end",
+       [](Answers &a, auto &, auto &, auto &, auto &) { a.password = "pw\rAutoLogon=Yes"; },
+       "AdminPassword holds a carriage return\n", {}},
+      {"name with a quote",
+       [](Answers &a, auto &, auto &, auto &, auto &) { a.fullName = "Bob\"X"; },
+       "FullName holds a double quote (\")\n", {}},
+      {"key with a line feed",
+       [](Answers &a, auto &, auto &, auto &, auto &) { a.productKey = "K\nX=1"; },
+       "ProductKey holds a line feed\n", {}},
+      {"password with a semicolon",
+       [](Answers &a, auto &, auto &, auto &, auto &) { a.password = "a;b"; },
+       "AdminPassword holds a semicolon (;), which ends the value when it is read\n", {}},
+      {"name with a control byte",
+       [](Answers &a, auto &, auto &, auto &, auto &) { a.fullName = "tab\tname"; },
+       "FullName holds the control character 0x09\n", {}},
+      {"name too long for its line",
+       [](Answers &a, auto &, auto &, auto &, auto &) {
+         static const std::string kLong(1010, 'n');
+         a.fullName = kLong.c_str();
+       },
+       "FullName is longer than 1008 bytes\n", {}},
   };
   for (const Case &c : cases) {
     SCOPED_TRACE(c.label);

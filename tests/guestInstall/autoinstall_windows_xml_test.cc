@@ -9,6 +9,8 @@
 #include "platform/xml_unique.h"
 #include "support/log_capture.h"
 
+using namespace tvx::autoinstall;
+
 namespace {
 
 using tvxtest::UnattendXml;

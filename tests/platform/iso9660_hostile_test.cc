@@ -284,7 +284,7 @@ TEST(Iso9660Hostile, UnsafeNamesAreListedButNeverExtracted) {
   }
 }
 
-TEST(Iso9660Hostile, ExistingSymlinkInDestinationIsNotFollowed) {
+TEST(Iso9660Hostile, ExistingLinksInDestinationAreNeverWrittenThrough) {
   IsoBuilder b;
   uint32_t data = b.NewBlocks(1), sub = b.NewBlocks(1);
   b.PutBlock(data, "payload");
@@ -296,9 +296,15 @@ TEST(Iso9660Hostile, ExistingSymlinkInDestinationIsNotFollowed) {
   tvxtest::TempDir tmp;
   tvxtest::WriteFileOrDie(tmp.Join("outside"), "keep");
   ASSERT_EQ(mkdir(tmp.Join("dest").c_str(), 0755), 0);
+  // A symbolic link and a hard link where files go lose their names; their
+  // targets keep their contents.
   ASSERT_EQ(symlink(tmp.Join("outside").c_str(), tmp.Join("dest/F").c_str()), 0);
-  EXPECT_EQ(Iso9660_Extract(img.image, "/", tmp.Join("dest").c_str()), ISO9660_ERR_UNSAFE);
+  ASSERT_EQ(mkdir(tmp.Join("dest/SUB").c_str(), 0755), 0);
+  ASSERT_EQ(link(tmp.Join("outside").c_str(), tmp.Join("dest/SUB/INNER").c_str()), 0);
+  EXPECT_EQ(Iso9660_Extract(img.image, "/", tmp.Join("dest").c_str()), ISO9660_OK);
   EXPECT_EQ(tvxtest::ReadFileOrDie(tmp.Join("outside")), "keep");
+  EXPECT_EQ(tvxtest::ReadFileOrDie(tmp.Join("dest/F")), "payload");
+  EXPECT_EQ(tvxtest::ReadFileOrDie(tmp.Join("dest/SUB/INNER")), "payload");
 
   ASSERT_EQ(mkdir(tmp.Join("elsewhere").c_str(), 0755), 0);
   ASSERT_EQ(mkdir(tmp.Join("dest2").c_str(), 0755), 0);

@@ -72,13 +72,13 @@ TEST(Iso9660Media, NamesFollowTheOpenMode) {
     const char *present;
     const char *absent;
   } cases[] = {
-      {"rr-joliet.iso", 0, "a-rather-long-file-name-that-needs-rock-ridge-or-joliet.text", "KERNEL."},
+      {"rr-joliet.iso", 0, "a-rather-long-file-name-that-needs-rock-ridge-or-joliet.text", "MIXED_DI"},
       {"rr-joliet.iso", 4, "KERNEL", "README.TXT;1"},
       {"rr-joliet.iso", 2, "Mixed Dir", "MIXED_DI"},
       {"rr-joliet.iso", 1, "MIXED_DI", "Mixed Dir"},
       {"joliet-only.iso", 4, "MIXED_DI", "Mixed Dir"},  // none accepted: plain names
       {"joliet-only.iso", 6, "Mixed Dir", "MIXED_DI"},
-      {"plain-l1.iso", 0, "KERNEL.", "KERNEL"},         // level 1 keeps the dot
+      {"plain-l1.iso", 0, "KERNEL", "KERNEL."},         // the separator of no extension goes
       {"plain-l1.iso", 2, "README.TXT", "readme.txt"},
       {"rr-relocated.iso", 4, "deep", "DEEP"},
   };

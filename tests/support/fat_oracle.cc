@@ -13,7 +13,12 @@ extern char **environ;
 
 namespace tvxtest {
 
-int RunArgv(const std::vector<std::string> &argv, std::string *out) {
+namespace {
+
+// Run runs argv (searched in PATH) with standard output and error into
+// `out`, since fsck.fat reports some findings on either; the exit status, -1
+// when it could not run.
+int Run(const std::vector<std::string> &argv, std::string *out) {
   // mtools refuses images whose geometry it doubts unless told not to.
   setenv("MTOOLS_SKIP_CHECK", "1", 1);
   int fds[2];
@@ -40,9 +45,11 @@ int RunArgv(const std::vector<std::string> &argv, std::string *out) {
   return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
 }
 
+}  // namespace
+
 std::string FatProblems(const std::string &image) {
   std::string out;
-  int status = RunArgv({"fsck.fat", "-n", image}, &out);
+  int status = Run({"fsck.fat", "-n", image}, &out);
   bool clean = status == 0;
   for (const char *bad : {"ong file", "rror", "ree cluster", "Fix", "Unrecover", "orrect",
                           "Duplicate", "Bad", "claimed", "truncat"}) {
@@ -54,7 +61,7 @@ std::string FatProblems(const std::string &image) {
 std::set<std::string> MtoolsNames(const std::string &image) {
   std::string out;
   std::set<std::string> names;
-  if (RunArgv({"mdir", "-b", "-i", image, "::/"}, &out) != 0) return names;
+  if (Run({"mdir", "-b", "-i", image, "::/"}, &out) != 0) return names;
   size_t start = 0;
   while (start < out.size()) {
     size_t end = out.find('\n', start);
@@ -68,7 +75,7 @@ std::set<std::string> MtoolsNames(const std::string &image) {
 bool MtoolsRead(const std::string &image, const std::string &name, std::string *data) {
   TempDir t;
   std::string path = t.Join("out"), log;
-  if (RunArgv({"mcopy", "-n", "-i", image, "::/" + name, path}, &log) != 0) return false;
+  if (Run({"mcopy", "-n", "-i", image, "::/" + name, path}, &log) != 0) return false;
   *data = ReadFileOrDie(path);
   return true;
 }
@@ -77,7 +84,7 @@ bool MtoolsWrite(const std::string &image, const std::string &name, const std::s
   TempDir t;
   std::string path = t.Join("in"), log;
   WriteFileOrDie(path, data);
-  return RunArgv({"mcopy", "-o", "-i", image, path, "::/" + name}, &log) == 0;
+  return Run({"mcopy", "-o", "-i", image, path, "::/" + name}, &log) == 0;
 }
 
 unsigned long TestFloppy::Open(const std::string &path, bool format) {

@@ -10,10 +10,6 @@
 
 namespace tvxtest {
 
-// RunArgv runs argv (searched in PATH), stdout and stderr into `out`: the
-// exit status, -1 when it could not run.
-int RunArgv(const std::vector<std::string> &argv, std::string *out);
-
 // FatProblems returns "" when `fsck.fat -n` finds the image clean, else its
 // report. fsck.fat exits 0 for some findings (long-name trouble among them),
 // so its words are read too.

@@ -266,11 +266,11 @@ class Builder {
     uint32_t blocks = static_cast<uint32_t>((d.size() + bs_ - 1) / bs_);
     uint32_t per = opt_.extentBlocks == 0 ? blocks : opt_.extentBlocks;
     std::vector<Ad> list;
-    // Unrecorded extents of whole blocks, at most 1 GiB each.
+    // Holes: unallocated extents of whole blocks, at most 1 GiB each.
     const uint32_t maxHole = (0x3FFFFFFFu / bs_) * bs_;
     for (uint64_t left = n.sparseBytes; left > 0;) {
       uint32_t len = static_cast<uint32_t>(std::min<uint64_t>(left, maxHole));
-      list.push_back({len, 1, 0, 0});
+      list.push_back({len, 2, 0, 0});
       left -= len;
     }
     for (uint32_t b = 0; b < blocks; b += per) {

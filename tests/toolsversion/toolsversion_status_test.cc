@@ -1,0 +1,260 @@
+// ToolsVersion_GetStatus without a usable tools image (the legacy number and
+// the guest's limits decide), the legacy number read from qemu-img disks,
+// and the extended config file: saved status, save/read round trip checked
+// with XPath, and a rewrite that fails half way.
+#include <gtest/gtest.h>
+#include <libxml/xpath.h>
+#include <sys/resource.h>
+
+#include <csignal>
+#include <filesystem>
+#include <cstdlib>
+#include <string>
+
+#include "platform/xml_unique.h"
+#include "support/log_capture.h"
+#include "tvx_toolsversion.h"
+
+namespace {
+
+using tvxtest::TempDir;
+using tvxtest::WriteFileOrDie;
+
+// A sparse disk made by qemu-img, its disk database's tools version patched.
+std::string MakeDisk(const TempDir &t, const std::string &name, unsigned toolsVersion) {
+  std::string path = t.Join(name);
+  std::string cmd = "qemu-img create -q -f vmdk '" + path + "' 1M";
+  if (std::system(cmd.c_str()) != 0) return "";
+  std::string bytes = tvxtest::ReadFileOrDie(path);
+  size_t at = bytes.find("ddb.toolsVersion = \"2147483647\"");
+  if (at == std::string::npos) return "";
+  char digits[11];
+  std::snprintf(digits, sizeof digits, "%010u", toolsVersion);
+  bytes.replace(at + 20, 10, digits);
+  WriteFileOrDie(path, bytes);
+  return path;
+}
+
+class ToolsVersionStatus : public ::testing::Test {
+ protected:
+  // Config writes the VM configuration (the tools directory is empty, so no
+  // host manifest can be had) and loads it.
+  Dictionary *Config(const std::string &extra) {
+    WriteFileOrDie(dir_.Join("vm.tvx"), "libdir = \"" + dir_.Path() +
+                                            "/no-tools\"\nextendedConfigFile = \"vm.xml\"\n" +
+                                            extra);
+    Dictionary_Free(config_);
+    config_ = Dictionary_Create();
+    EXPECT_TRUE(Dictionary_LoadEx(config_, ConfigPath().c_str(), nullptr));
+    return config_;
+  }
+  std::string ConfigPath() const { return dir_.Join("vm.tvx"); }
+  std::string Xml() const { return tvxtest::ReadFileOrDie(dir_.Join("vm.xml")); }
+  void TearDown() override { Dictionary_Free(config_); }
+
+  TempDir dir_;
+  Dictionary *config_ = nullptr;
+};
+
+TEST_F(ToolsVersionStatus, LegacyNumberAgainstTheGuestsLimits) {
+  std::string disk9216 = MakeDisk(dir_, "a.vmdk", 9216);
+  std::string disk10252 = MakeDisk(dir_, "b.vmdk", 10252);
+  ASSERT_FALSE(disk9216.empty() || disk10252.empty()) << "qemu-img is needed";
+  const std::string xp = "guestOS = \"winXPPro\"\n";
+  const std::string disks =
+      "scsi0.present = TRUE\nscsi0:0.present = TRUE\nscsi0:0.fileName = a.vmdk\n"
+      "scsi0:1.present = TRUE\nscsi0:1.fileName = b.vmdk\n";
+  struct Case {
+    const char *name;
+    std::string config;
+    const char *guestText;  // null: read the (absent) extended config file
+    uint32_t toolsVersion;
+    int32_t mode;
+    uint32_t status;
+  } cases[] = {
+      {"mode outside -1..2", xp, "", 10252, 5, TOOLS_STATUS_NOT_APPLICABLE},
+      {"hypervisor guest in mode 2", "guestOS = zelcore\n", "", 10252, 2,
+       TOOLS_STATUS_NOT_APPLICABLE},
+      {"hypervisor guest in mode 1", "guestOS = zelcore\n", "", 12384, 1, TOOLS_STATUS_CURRENT},
+      {"no tools", xp, "", 0, 0, TOOLS_STATUS_NOT_INSTALLED},
+      {"not applicable number", xp, "", 0x7FFFFFFF, 0, TOOLS_STATUS_NOT_APPLICABLE},
+      {"no guestOS at the default", "", "", 12384, 0, TOOLS_STATUS_CURRENT},
+      {"no guestOS below the default", "", nullptr, 12383, 0, TOOLS_STATUS_TOO_OLD},
+      {"XP at its maximum", xp, "", 10252, -1, TOOLS_STATUS_CURRENT},
+      {"XP between", xp, "", 9216, 0, TOOLS_STATUS_SUPPORTED_OLD},
+      {"XP below its minimum", xp, "", 8383, 0, TOOLS_STATUS_TOO_OLD},
+      {"XP, newest disk decides", xp + disks, "", 0xFFFFFFFF, 0, TOOLS_STATUS_CURRENT},
+      {"disks named but absent", xp + "ide0:0.present = TRUE\nide0:0.fileName = x.vmdk\n", "",
+       0xFFFFFFFF, 0, TOOLS_STATUS_NOT_INSTALLED},
+      {"no disks at all", xp, "", 0xFFFFFFFF, 0, TOOLS_STATUS_NOT_INSTALLED},
+      {"Windows 98 window", "guestOS = win98\n", "", 7392, 0, TOOLS_STATUS_CURRENT},
+  };
+  for (const Case &c : cases) {
+    Dictionary *config = Config(c.config);
+    EXPECT_EQ(ToolsVersion_GetStatus(ConfigPath().c_str(), config, nullptr, c.guestText,
+                                     c.toolsVersion, c.mode),
+              c.status)
+        << c.name;
+  }
+}
+
+TEST_F(ToolsVersionStatus, DiskQueryFailureAndHardwareVersion) {
+  Dictionary *config = Config("guestOS = winXPPro\n");
+  // Without a configuration path the disks cannot be listed.
+  EXPECT_EQ(ToolsVersion_GetStatus(nullptr, config, nullptr, "monolithic.version = 1\n",
+                                   0xFFFFFFFF, 0),
+            TOOLS_STATUS_TOO_OLD);
+  EXPECT_EQ(ToolsVersion_GetStatus(nullptr, config, nullptr,
+                                   "monolithic.version = 1\nvirtualHW.version = 21\n",
+                                   0xFFFFFFFF, 0),
+            TOOLS_STATUS_UNKNOWN);
+}
+
+TEST_F(ToolsVersionStatus, SavedStatusIsPassedOnUnlessZeroOrUnknown) {
+  Dictionary *config = Config("guestOS = ubuntu-64\n");
+  struct Case {
+    const char *status;
+    uint32_t expected;
+  } cases[] = {{"4", TOOLS_STATUS_SUPPORTED_NEW}, {"6", TOOLS_STATUS_BLACKLISTED},
+               {"9", TOOLS_STATUS_CURRENT},       {"0", TOOLS_STATUS_CURRENT},
+               {"junk", TOOLS_STATUS_CURRENT}};
+  for (const Case &c : cases) {
+    WriteFileOrDie(dir_.Join("vm.xml"),
+                   std::string("<vm><update-agent-info><tools><monolithic status=\"") + c.status +
+                       "\"/></tools></update-agent-info></vm>");
+    EXPECT_EQ(ToolsVersion_GetStatus(ConfigPath().c_str(), config, nullptr, nullptr, 12384, 0),
+              c.expected)
+        << c.status;
+  }
+  struct Fault {
+    const char *xml;  // null: no file
+    const char *line;
+  } faults[] = {
+      {nullptr, "ToolsVersion: Failed to get xml buffer from extended config file.\n"},
+      {"<vm>", "ToolsVersion: Error parsing xml from extended config file.\n"},
+      {"<vm> </vm>", "ToolsVersion: Failed to find manifest content in extended config xml.\n"},
+      {"<vm><tools-manifest/></vm>",
+       "ToolsVersion: Failed to find manifest content in extended config xml.\n"},
+  };
+  for (const Fault &f : faults) {
+    std::remove(dir_.Join("vm.xml").c_str());
+    if (f.xml != nullptr) WriteFileOrDie(dir_.Join("vm.xml"), f.xml);
+    tvxtest::LogCapture log;
+    // Nothing read: a Linux guest between its limits.
+    EXPECT_EQ(ToolsVersion_GetStatus(ConfigPath().c_str(), config, nullptr, nullptr, 12383, 0),
+              TOOLS_STATUS_SUPPORTED_OLD);
+    EXPECT_TRUE(log.Contains(f.line)) << log.All();
+  }
+}
+
+// XPath returns the count of the nodes `expr` selects and their texts
+// joined by "|": "2:a|b".
+std::string XPath(const std::string &xml, const char *expr) {
+  tvx::UniquePtr<xmlDoc> doc(xmlReadMemory(xml.data(), static_cast<int>(xml.size()), nullptr,
+                                           nullptr, XML_PARSE_NONET));
+  if (doc == nullptr) return "<unparsable>";
+  tvx::UniquePtr<xmlXPathContext> ctx(xmlXPathNewContext(doc.get()));
+  tvx::UniquePtr<xmlXPathObject> obj(
+      xmlXPathEvalExpression(reinterpret_cast<const xmlChar *>(expr), ctx.get()));
+  if (obj == nullptr || obj->nodesetval == nullptr) return "0:";
+  std::string out = std::to_string(obj->nodesetval->nodeNr) + ":";
+  for (int i = 0; i < obj->nodesetval->nodeNr; i++) {
+    tvx::XmlChars text(xmlNodeGetContent(obj->nodesetval->nodeTab[i]));
+    if (i > 0) out += "|";
+    out += reinterpret_cast<const char *>(text.get());
+  }
+  return out;
+}
+
+TEST_F(ToolsVersionStatus, SaveMergesAndReadsBack) {
+  Config("guestOS = ubuntu-64\n");
+  const std::string cfg = ConfigPath();
+  WriteFileOrDie(dir_.Join("vm.xml"),
+                 "<vm><keep>x</keep><tools-manifest><old version=\"1\" installed=\"TRUE\"/>"
+                 "</tools-manifest><update-agent-info><tools/><other/></update-agent-info></vm>");
+  // Nothing to save: the file is not touched.
+  EXPECT_TRUE(ToolsVersion_SaveXmlInfo(cfg.c_str(), "", nullptr, 5, 0));
+  EXPECT_EQ(XPath(Xml(), "//old/@version"), "1:1");
+
+  const char *agent =
+      "<r><tools><monolithic guestVersion=\"12.1.0\" repoVersion=\"12.2.0\" status=\"2\" "
+      "other=\"dropped\"/></tools><drivers><net status=\"3\"/></drivers></r>";
+  ASSERT_TRUE(ToolsVersion_SaveXmlInfo(cfg.c_str(), agent, nullptr, -1, 3));
+  std::string xml = Xml();
+  EXPECT_EQ(XPath(xml, "/vm/keep"), "1:x");
+  EXPECT_EQ(XPath(xml, "//update-agent-info/other"), "0:");
+  EXPECT_EQ(XPath(xml, "/vm/update-agent-info/tools/monolithic/@repoVersion"), "1:12.2.0");
+  EXPECT_EQ(XPath(xml, "//monolithic/@other"), "0:");
+  EXPECT_EQ(XPath(xml, "/vm/update-agent-info/drivers/net/@status"), "1:3");
+  EXPECT_EQ(XPath(xml, "/vm/tools-manifest/monolithic/@version"), "1:12.1.0");
+  EXPECT_EQ(XPath(xml, "//tools-manifest/*"), "1:");
+  EXPECT_EQ(XPath(xml, "/vm/tools-install-info/installError"), "1:-1");
+  EXPECT_EQ(XPath(xml, "/vm/tools-install-info/*[2][self::updateCounter]"), "1:3");
+
+  // A manifest replaces the agent's monolithic version; encoding is skipped.
+  ASSERT_TRUE(ToolsVersion_SaveXmlInfo(
+      cfg.c_str(), "null",
+      "alpha.version = 1.2\nalpha.INSTALLED = TRUE\nalpha.encoding = UTF-8\nbare = 1\n", 0, 4));
+  xml = Xml();
+  EXPECT_EQ(XPath(xml, "/vm/tools-manifest/alpha/@version"), "1:1.2");
+  EXPECT_EQ(XPath(xml, "/vm/tools-manifest/alpha/@installed"), "1:TRUE");
+  EXPECT_EQ(XPath(xml, "/vm/tools-manifest/alpha/@*"), "2:1.2|TRUE");
+  EXPECT_EQ(XPath(xml, "//tools-manifest"), "1:");  // the agent's one is replaced
+  EXPECT_EQ(XPath(xml, "/vm/tools-manifest/*[2][self::bare]"), "1:");
+  EXPECT_EQ(XPath(xml, "/vm/tools-install-info/installError"), "1:0");
+  EXPECT_EQ(XPath(xml, "/vm/update-agent-info/tools/monolithic/@status"), "1:2");
+
+  // The saved status 2 stands; "no tools" forgets it and the manifest.
+  Dictionary *config = Config("guestOS = ubuntu-64\n");
+  EXPECT_EQ(ToolsVersion_GetStatus(cfg.c_str(), config, nullptr, nullptr, 12384, 0),
+            TOOLS_STATUS_SUPPORTED_OLD);
+  ASSERT_TRUE(ToolsVersion_SaveXmlInfo(cfg.c_str(), "no tools", nullptr, 0, 0));
+  xml = Xml();
+  EXPECT_EQ(XPath(xml, "/vm/update-agent-info/tools"), "0:");
+  EXPECT_EQ(XPath(xml, "/vm/update-agent-info/drivers"), "1:");
+  EXPECT_EQ(XPath(xml, "/vm/tools-manifest"), "0:");
+  EXPECT_EQ(XPath(xml, "/vm/keep"), "1:x");
+}
+
+TEST_F(ToolsVersionStatus, FailedSaveLeavesTheFileAsItWas) {
+  Config("");
+  const std::string cfg = ConfigPath();
+  const std::string before = "<vm><tools-manifest><a version=\"1\"/></tools-manifest></vm>";
+  WriteFileOrDie(dir_.Join("vm.xml"), before);
+  struct Case {
+    const char *agent, *manifest;
+    const char *line;
+  } cases[] = {
+      {"<r>", nullptr, "ToolsVersion: Error parsing xml from update agent.\n"},
+      {nullptr, "a.version = \"1", "ToolsVersion: Error loading dictionary from manifest buffer"},
+  };
+  for (const Case &c : cases) {
+    tvxtest::LogCapture log;
+    EXPECT_FALSE(ToolsVersion_SaveXmlInfo(cfg.c_str(), c.agent, c.manifest, 0, 1));
+    EXPECT_TRUE(log.Contains(c.line)) << log.All();
+    EXPECT_EQ(Xml(), before);
+  }
+
+  // The write itself fails after the temporary file has taken some bytes:
+  // the file size limit stops it half way.
+  struct rlimit old;
+  ASSERT_EQ(getrlimit(RLIMIT_FSIZE, &old), 0);
+  struct rlimit small = old;
+  small.rlim_cur = 16;
+  auto oldHandler = std::signal(SIGXFSZ, SIG_IGN);
+  ASSERT_EQ(setrlimit(RLIMIT_FSIZE, &small), 0);
+  tvxtest::LogCapture log;
+  Bool saved = ToolsVersion_SaveXmlInfo(cfg.c_str(), nullptr, "b.version = 2\n", 0, 7);
+  setrlimit(RLIMIT_FSIZE, &old);
+  std::signal(SIGXFSZ, oldHandler);
+  EXPECT_FALSE(saved);
+  EXPECT_TRUE(log.Contains("ToolsVersion: Error writing to extended config file: errcode 27.\n"))
+      << log.All();
+  EXPECT_TRUE(log.Contains("ToolsVersion: Failed to save xml buffer in extended config file.\n"));
+  EXPECT_EQ(Xml(), before);
+  size_t files = 0;
+  for (const auto &e : std::filesystem::directory_iterator(dir_.Path())) files += e.exists();
+  EXPECT_EQ(files, 2u);  // vm.tvx and vm.xml only: no temporary file left
+}
+
+}  // namespace
