@@ -155,15 +155,10 @@ static void TestWindowsAnswers(void) {
 /* The SHA-256 crypt and a Linux answer file. */
 static void TestLinuxAnswers(void) {
   char dir[] = "/tmp/tvx_c_api_linux_XXXXXX";
-  char out[600], hash[128], small[8], b64[4];
-  char *cp = b64;
-  int left = 4;
+  char out[600], hash[128];
   phase = "linux answers";
   CHECK(SHA256_crypt("Hello world!", "$5$saltstring", hash, (int)sizeof hash) == hash);
   CHECK(strcmp(hash, "$5$saltstring$5B8vYYiY.CVt1RlTTf8KbXBH3hsxY/GNooZaBBGWEc5") == 0);
-  CHECK(SHA256_crypt("Hello world!", "$5$saltstring", small, (int)sizeof small) == NULL);
-  b64_from_24bit(0, 0, 1, 4, &left, &cp);
-  CHECK(left == 0 && memcmp(b64, "/...", 4) == 0);
   if (mkdtemp(dir) == NULL) {
     CHECK(!"temporary directory made");
     return;
