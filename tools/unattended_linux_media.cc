@@ -11,6 +11,7 @@
 #include "tvx_autoinstall.h"
 #include "tvx_autoinstall_linux_media.h"
 #include "tvx_log.h"
+#include "staged_output.h"
 
 namespace tvxcli {
 
@@ -78,35 +79,6 @@ namespace {
 
 namespace fs = std::filesystem;
 
-// Staging is a private directory inside the media directory (one file
-// system, so finished media are renamed into place); it goes with whatever
-// is left in it, so a failed run adds nothing to the media directory.
-class Staging {
- public:
-  explicit Staging(const std::string &dir) : path_((fs::path(dir) / ".autoinst.XXXXXX").string()) {
-    if (::mkdtemp(path_.data()) == nullptr) path_.clear();
-  }
-  ~Staging() {
-    std::error_code ec;
-    if (!path_.empty()) fs::remove_all(path_, ec);
-  }
-  Staging(const Staging &) = delete;
-  Staging &operator=(const Staging &) = delete;
-  const std::string &Path() const { return path_; }
-  // Commit moves the staged file `name` into `dir`.
-  bool Commit(const char *name, const std::string &dir, std::vector<std::string> *files) {
-    std::error_code ec;
-    fs::path to = fs::path(dir) / name;
-    fs::rename(fs::path(path_) / name, to, ec);
-    if (ec) return false;
-    files->push_back(to.string());
-    return true;
-  }
-
- private:
-  std::string path_;
-};
-
 // MakeBootCd builds the boot tree (answer file and tools included) in the
 // staging directory and masters it into autoinst.iso there.
 bool MakeBootCd(const std::string &medium, const GuessResult &guess,
@@ -121,9 +93,12 @@ bool MakeBootCd(const std::string &medium, const GuessResult &guess,
   std::error_code ec;
   fs::create_directory(tree, ec);
   if (!ec && !answerFile.empty()) fs::copy_file(answerFile, fs::path(tree) / "ks.cfg", ec);
-  return !ec && ScanMedium(medium, tree, guess.guestOS, guess.version, o.isolinuxBin) &&
-         (o.toolsDir.empty() || AutoInstall_AddTools_Linux(tree.c_str(), o.toolsDir.c_str())) &&
-         AutoInstall_MasterISO(tree.c_str(), mkisofs.c_str(), stage.c_str());
+  if (!ec && ScanMedium(medium, tree, guess.guestOS, guess.version, o.isolinuxBin) &&
+      (o.toolsDir.empty() || AutoInstall_AddTools_Linux(tree.c_str(), o.toolsDir.c_str()))) {
+    return AutoInstall_MasterISO(tree.c_str(), mkisofs.c_str(), stage.c_str());  // takes the tree
+  }
+  fs::remove_all(tree, ec);
+  return false;
 }
 
 }  // namespace
@@ -131,29 +106,31 @@ bool MakeBootCd(const std::string &medium, const GuessResult &guess,
 bool MakeLinuxMedia(const std::string &medium, const GuessResult &guess,
                     const std::string &answerDir, const LinuxMediaOptions &o,
                     std::vector<std::string> *out_files, std::vector<std::string> *out_notes) {
-  std::error_code ec;
-  fs::create_directories(o.mediaDir, ec);
-  Staging stage(o.mediaDir);
-  if (stage.Path().empty()) {
-    std::fprintf(stderr, "tvxguest: cannot create a directory in %s\n", o.mediaDir.c_str());
+  StagedOutput stage(o.mediaDir);
+  std::string err;
+  if (!stage.Open(&err)) {
+    std::fprintf(stderr, "tvxguest: %s\n", err.c_str());
     return false;
   }
+  bool ok;
   if (!AutoInstall_NeedsFloppy_Linux(guess.guestOS)) {
-    return MakeBootCd(medium, guess, (fs::path(answerDir) / "ks.cfg").string(), o,
-                      stage.Path()) &&
-           stage.Commit("autoinst.iso", o.mediaDir, out_files);
+    ok = MakeBootCd(medium, guess, (fs::path(answerDir) / "ks.cfg").string(), o, stage.dir());
+  } else {
+    ok = AutoInstall_MakeFloppyImg_Linux(answerDir.c_str(), stage.dir().c_str(),
+                                         o.templateDir.c_str(), guess.guestOS);
+    // The floppy guest boots the same kind of CD, whose arguments send the
+    // installer to the floppy; without one the arguments are typed at the
+    // medium's own boot prompt.
+    if (ok && !MakeBootCd(medium, guess, "", o, stage.dir())) {
+      out_notes->push_back("no boot CD: the medium's isolinux boot tree could not be copied");
+    }
   }
-  if (!AutoInstall_MakeFloppyImg_Linux(answerDir.c_str(), stage.Path().c_str(),
-                                       o.templateDir.c_str(), guess.guestOS)) {
-    return false;
+  if (ok && !stage.Commit(&err)) {
+    std::fprintf(stderr, "tvxguest: %s\n", err.c_str());
+    ok = false;
   }
-  // The floppy guest boots the same kind of CD, whose arguments send the
-  // installer to the floppy; without one the arguments are typed at the
-  // medium's own boot prompt.
-  bool cd = MakeBootCd(medium, guess, "", o, stage.Path());
-  if (!cd) out_notes->push_back("no boot CD: the medium's isolinux boot tree could not be copied");
-  return stage.Commit("autoinst.flp", o.mediaDir, out_files) &&
-         (!cd || stage.Commit("autoinst.iso", o.mediaDir, out_files));
+  if (ok) out_files->insert(out_files->end(), stage.committed().begin(), stage.committed().end());
+  return ok;
 }
 
 bool ContinueWithMedia(const std::string &medium, const GuessResult &guess,
@@ -161,29 +138,14 @@ bool ContinueWithMedia(const std::string &medium, const GuessResult &guess,
                        std::vector<std::string> *files, std::vector<std::string> *log) {
   if (o.mediaDir.empty()) return true;
   std::vector<std::string> notes;
-  LogCapture capture;
+  LogLines capture;
   bool ok = MakeLinuxMedia(medium, guess, answerDir, o, files, &notes);
-  log->insert(log->end(), capture.Lines().begin(), capture.Lines().end());
+  log->insert(log->end(), capture.lines.begin(), capture.lines.end());
   for (const std::string &note : notes) {
     log->push_back("note: " + note);
     if (!json) std::fprintf(stderr, "tvxguest: note: %s\n", note.c_str());
   }
   return ok;
-}
-
-namespace {
-void Capture(TvxLogLevel, const char *text, void *ctx) {
-  std::string line = text;
-  if (!line.empty() && line.back() == '\n') line.pop_back();
-  static_cast<std::vector<std::string> *>(ctx)->push_back(line);
-}
-}  // namespace
-
-LogCapture::LogCapture() : active_(!Verbose()) {
-  if (active_) Tvx_SetLogSink(Capture, &lines_);
-}
-LogCapture::~LogCapture() {
-  if (active_) Tvx_SetLogSink(nullptr, nullptr);
 }
 
 }  // namespace tvxcli
