@@ -208,12 +208,12 @@ int Run(const std::vector<std::string> &args) {
   bool ok = stage.Open(&error);
   if (!ok) log.push_back("cannot make a staging directory for " + o.out + ": " + error);
   if (ok) {
-    LogCapture capture;
+    LogLines capture;
     ok = AutoInstall_PrepareAnswerFileEx_Linux(
         guess.guestOS, guess.version, stage.dir().c_str(), o.user.c_str(), o.fullName.c_str(),
         o.password.c_str(), (o.haveRoot ? o.rootPassword : o.password).c_str(),
         o.haveKey ? o.key.c_str() : nullptr, o.powerOff, 0, o.nvme);
-    log = capture.Lines();
+    log = capture.lines;
     if (!ok && log.empty()) {
       log.push_back(std::string("no Linux answer file is made for ") + guess.guestOS);
     }
