@@ -7,7 +7,6 @@
 #include <string>
 
 #include "fuzz/split_input.h"
-
 #include "lib/toolsversion/toolsversion_internal.h"
 
 namespace {
@@ -54,8 +53,8 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
   HashTable_ForEach(table.get(), CheckComponent, nullptr);
   Report report;
   uint32_t status = EvaluateTable(table.get(), switches, &report);
-  if (status < TOOLS_STATUS_TOO_OLD || (status > TOOLS_STATUS_BLACKLISTED &&
-                                        status != TOOLS_STATUS_UNKNOWN)) {
+  if (status < TOOLS_STATUS_TOO_OLD ||
+      (status > TOOLS_STATUS_BLACKLISTED && status != TOOLS_STATUS_UNKNOWN)) {
     std::abort();
   }
   if (report.monolithic.rating > TOOLS_COMPONENT_GONE) std::abort();

@@ -10,7 +10,6 @@
 #include <string>
 
 #include "fuzz/split_input.h"
-
 #include "lib/toolsversion/toolsversion_xml.h"
 #include "platform/file.h"
 #include "tvx_log.h"
@@ -33,6 +32,7 @@ struct Files {
     std::fclose(f);
     Tvx_SetLogSink(Quiet, nullptr);
   }
+  ~Files() { File_DeleteDirectoryTree(dir.c_str()); }
 };
 
 }  // namespace

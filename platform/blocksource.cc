@@ -47,16 +47,19 @@ class CbSource final : public BlockSource {
   ~CbSource() override {
     if (close_ != nullptr) close_(handle_);
   }
-  // Callers' readers see whole 2048-byte sectors: a reader that checks each
-  // block of the image against a hash (the verified tools image) cannot serve
-  // a slice of a block. A widened read that fails (an image whose size is not
-  // a whole number of sectors) is tried again as asked.
+  // Callers' readers see whole aligned pieces: a reader that checks each
+  // block of the image against a hash (the verified tools image, with
+  // blocks of up to 4096 bytes) cannot serve a slice of a block. A read
+  // widened to 4096 bytes can fail at the end of an image that is an odd
+  // number of 2048-byte sectors long; it is tried again widened to the
+  // sector, and last as asked.
   bool ReadAt(uint64_t offset, void *buf, size_t len) override {
     if (len == 0) return true;
-    uint64_t first = offset / kSector * kSector;
-    if (offset > UINT64_MAX - len || offset + len > UINT64_MAX - kSector) return false;
-    uint64_t end = (offset + len + kSector - 1) / kSector * kSector;
-    if (first != offset || end != offset + len) {
+    if (len > UINT64_MAX - kWide || offset > UINT64_MAX - kWide - len) return false;
+    for (uint64_t unit : {kWide, kSector}) {
+      uint64_t first = offset / unit * unit;
+      uint64_t end = (offset + len + unit - 1) / unit * unit;
+      if (first == offset && end == offset + len) break;
       scratch_.resize(static_cast<size_t>(end - first));
       if (read_(handle_, scratch_.data(), scratch_.size(), first) != 0) {
         std::memcpy(buf, scratch_.data() + (offset - first), len);
@@ -71,7 +74,7 @@ class CbSource final : public BlockSource {
   uint64_t Size() const override { return 0; }
 
  private:
-  static constexpr uint64_t kSector = 2048;
+  static constexpr uint64_t kWide = 4096, kSector = 2048;
   SourceReadFn read_;
   SourceCloseFn close_;
   void *handle_;

@@ -63,6 +63,7 @@ const CurlApi *LoadCurl() {
 // transfer.
 constexpr size_t kMaxErrorBody = 64 * 1024;
 constexpr long kMaxRedirects = 3;
+constexpr long kReceiveBuffer = 512 * 1024;
 
 bool IsHttpUrl(const char *url) {
   return url != nullptr &&
@@ -200,6 +201,8 @@ void Prepare(HttpConnection *conn, const char *url, long totalMs) {
   a.easy_setopt(c, CURLOPT_LOW_SPEED_LIMIT, 1L);
   a.easy_setopt(c, CURLOPT_LOW_SPEED_TIME, conn->timeoutMs < 1000 ? 1L : conn->timeoutMs / 1000);
   a.easy_setopt(c, CURLOPT_NOSIGNAL, 1L);  // a library must not touch signal handlers
+  // Image reads are large: fewer, larger hand-overs from the receive buffer.
+  a.easy_setopt(c, CURLOPT_BUFFERSIZE, kReceiveBuffer);
   if (!conn->user.empty()) {
     a.easy_setopt(c, CURLOPT_USERNAME, conn->user.c_str());
     a.easy_setopt(c, CURLOPT_PASSWORD, conn->password.c_str());

@@ -107,7 +107,9 @@ int Run(const std::vector<std::string> &args) {
   return haveCheck && !matches ? 1 : 0;
 }
 
-const CommandRegistration kRegistration({kName, "print or check the SHA-256 crypt form of a password", Run});
+const CommandRegistration kRegistration({kName,
+                                         "print or check the SHA-256 crypt form of a password",
+                                         Run});
 
 }  // namespace
 }  // namespace tvxcli

@@ -23,7 +23,7 @@ constexpr const char *kStatusCmd = "tools status";
 constexpr const char *kSaveCmd = "tools save-info";
 
 constexpr const char *kStatusUsage =
-    "Usage: tvxguest tools status [--guest-manifest FILE] [--tools-version N]\n"
+    "Usage: tvxguest tools status [--guest-manifest FILE] [--tools-version N] [--cert FILE]\n"
     "           [--mode M] [--json] VMCONFIG\n\n"
     "Computes the guest-tools status of the virtual machine whose configuration is\n"
     "VMCONFIG: the guest's manifest (FILE, else the one saved in the machine's\n"
@@ -37,6 +37,8 @@ constexpr const char *kStatusUsage =
     "                         default: read it from the machine's virtual disks\n"
     "  --mode M               -1, 0, 1, or 2 (also: hypervisor guests are not\n"
     "                         applicable); default 0\n"
+    "  --cert FILE            trust the maker certificates in FILE for the image\n"
+    "                         and the AVR manifest (default: the installed ones)\n"
     "  --json                 print one JSON object\n"
     "  -h, --help             show this help\n\n"
     "Exit status: 0 (the status is printed), 66 VMCONFIG cannot be read, 64 usage\n"
@@ -123,19 +125,19 @@ std::string ReportJson(const ToolsVersionReport &r) {
 }
 
 void PrintComponents(const ToolsVersionReport &r) {
-  std::printf("  %-24s %-24s %-14s %s %-14s %-14s %-14s %s\n", "component", "rating", "guest",
-              "I", "host", "AVR min", "AVR max", "AVR illegal");
+  std::printf("  %-24s %-24s %-14s %s %-14s %-14s %-14s %s\n", "component", "rating", "guest", "I",
+              "host", "AVR min", "AVR max", "AVR illegal");
   auto row = [](const ToolsVersionComponent &c) {
     std::printf("  %-24s %-24s %-14s %c %-14s %-14s %-14s %s\n", c.name,
-                ToolsVersion_ComponentStatusText(c.rating), c.guestVersion,
-                c.installed ? 'Y' : 'N', c.hostVersion, c.avrMin, c.avrMax, c.avrIllegal);
+                ToolsVersion_ComponentStatusText(c.rating), c.guestVersion, c.installed ? 'Y' : 'N',
+                c.hostVersion, c.avrMin, c.avrMax, c.avrIllegal);
   };
   row(r.monolithic);
   for (size_t i = 0; i < r.numComponents; i++) row(r.components[i]);
 }
 
 int Status(const std::vector<std::string> &args) {
-  std::string guestManifest, config;
+  std::string guestManifest, config, cert;
   long long toolsVersion = TOOLS_VERSION_FROM_DISKS, mode = 0;
   bool json = false;
   for (size_t i = 0; i < args.size(); i++) {
@@ -154,6 +156,8 @@ int Status(const std::vector<std::string> &args) {
       if (!ParseInt(args[++i], INT32_MIN, INT32_MAX, &mode)) {
         return UsageError(kStatusCmd, "--mode needs a number");
       }
+    } else if (a == "--cert" && hasValue) {
+      cert = args[++i];
     } else if (a == "--json") {
       json = true;
     } else if (a.size() > 1 && a[0] == '-') {
@@ -176,10 +180,10 @@ int Status(const std::vector<std::string> &args) {
   ToolsVersionReport *report = nullptr;
   {
     LogLines log;
-    ToolsVersion_GetStatusReport(config.c_str(), dict, guestManifest.empty() ? nullptr
-                                                                             : guestManifest.c_str(),
-                                 nullptr, static_cast<uint32_t>(toolsVersion),
-                                 static_cast<int32_t>(mode), &report);
+    ToolsVersion_GetStatusReport(config.c_str(), dict,
+                                 guestManifest.empty() ? nullptr : guestManifest.c_str(), nullptr,
+                                 static_cast<uint32_t>(toolsVersion), static_cast<int32_t>(mode),
+                                 cert.empty() ? nullptr : cert.c_str(), &report);
   }
   Dictionary_Free(dict);
   if (report == nullptr) return 70;

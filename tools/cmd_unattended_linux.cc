@@ -1,11 +1,8 @@
 // tvxguest unattended linux: recognise a Linux install image and write its
 // answer file. The file is made in a staging directory beside --out and
 // moved into place only when the whole call succeeded, so a failing call
-// leaves neither a file nor a directory behind.
+// leaves nothing in --out.
 #if __has_include("command_group.h") && __has_include("unattended_common.h")
-#include <stdlib.h>
-#include <unistd.h>
-
 #include <cstdio>
 #include <cstring>
 #include <filesystem>
@@ -17,10 +14,10 @@
 #include "command.h"
 #include "command_group.h"
 #include "json.h"
+#include "staged_output.h"
 #include "tvx_autoinstall.h"
 #include "tvx_autoinstall_linux.h"
 #include "tvx_guess.h"
-#include "tvx_log.h"
 #include "unattended_common.h"
 #include "unattended_linux_media.h"
 
@@ -83,10 +80,14 @@ int Parse(const std::vector<std::string> &args, Options *o) {
   };
   std::string passwordFile, rootFile;
   Valued valued[] = {
-      {"--user", &o->user},          {"--full-name", &o->fullName},
-      {"--password", &o->password},  {"--password-file", &passwordFile},
-      {"--root-password", &o->rootPassword}, {"--root-password-file", &rootFile},
-      {"--install-key", &o->key},    {"--out", &o->out},
+      {"--user", &o->user},
+      {"--full-name", &o->fullName},
+      {"--password", &o->password},
+      {"--password-file", &passwordFile},
+      {"--root-password", &o->rootPassword},
+      {"--root-password-file", &rootFile},
+      {"--install-key", &o->key},
+      {"--out", &o->out},
   };
   enum { kUser, kFullName, kPassword, kPasswordFile, kRoot, kRootFile, kKey, kOut };
   const std::pair<const char *, bool *> flags[] = {
@@ -155,63 +156,23 @@ int Parse(const std::vector<std::string> &args, Options *o) {
   return -1;
 }
 
-void Capture(TvxLogLevel, const char *text, void *ctx) {
-  std::string line = text;
-  if (!line.empty() && line.back() == '\n') line.pop_back();
-  static_cast<std::vector<std::string> *>(ctx)->push_back(line);
-}
-
-// Staging is a private directory beside the output directory (in its
-// nearest existing ancestor, so renames stay on one file system); it is
-// removed with whatever is left in it.
-class Staging {
- public:
-  explicit Staging(const fs::path &out) {
-    fs::path base = out;
-    std::error_code ec;
-    while (!base.empty() && !fs::exists(base, ec) && base != base.parent_path()) {
-      base = base.parent_path();
+// FilesBelow lists the files among the committed entries and in the
+// committed directories (Ubuntu's "custom").
+std::vector<std::string> FilesBelow(const std::vector<std::string> &entries) {
+  std::vector<std::string> files;
+  std::error_code ec;
+  for (const std::string &e : entries) {
+    if (!fs::is_directory(fs::symlink_status(e, ec))) {
+      files.push_back(e);
+      continue;
     }
-    std::string tmpl = (base / ".tvxguest-stage-XXXXXX").string();
-    if (mkdtemp(tmpl.data()) != nullptr) path_ = tmpl;
-  }
-  ~Staging() {
-    std::error_code ec;
-    if (!path_.empty()) fs::remove_all(path_, ec);
-  }
-  Staging(const Staging &) = delete;
-  Staging &operator=(const Staging &) = delete;
-  const std::string &Path() const { return path_; }
-
-  // Commit moves every file made in the staging directory to the same place
-  // below `out`; on failure the directories it made are removed again.
-  bool Commit(const fs::path &out, std::vector<std::string> *out_files, std::string *out_error) {
-    std::error_code ec;
-    fs::path firstMissing;
-    for (fs::path p = out; !p.empty() && !fs::exists(p, ec); p = p.parent_path()) {
-      firstMissing = p;
-      if (p == p.parent_path()) break;
-    }
-    for (auto it = fs::recursive_directory_iterator(path_, ec);
+    for (auto it = fs::recursive_directory_iterator(e, ec);
          !ec && it != fs::recursive_directory_iterator(); it.increment(ec)) {
-      if (!it->is_regular_file(ec)) continue;
-      fs::path target = out / fs::relative(it->path(), path_, ec);
-      fs::create_directories(target.parent_path(), ec);
-      if (!ec) fs::rename(it->path(), target, ec);
-      if (ec) break;
-      out_files->push_back(target.string());
+      if (it->is_regular_file(ec)) files.push_back(it->path().string());
     }
-    if (!ec) return true;
-    *out_error = ec.message();
-    std::error_code ignored;
-    if (!firstMissing.empty()) fs::remove_all(firstMissing, ignored);
-    out_files->clear();
-    return false;
   }
-
- private:
-  std::string path_;
-};
+  return files;
+}
 
 int Run(const std::vector<std::string> &args) {
   Options o;
@@ -229,8 +190,7 @@ int Run(const std::vector<std::string> &args) {
                               .Text()
                               .c_str());
     } else if (guessRc != 2) {
-      std::fprintf(stderr, "tvxguest %s: no guest OS recognised on %s\n", kName,
-                   o.image.c_str());
+      std::fprintf(stderr, "tvxguest %s: no guest OS recognised on %s\n", kName, o.image.c_str());
     }
     return guessRc == 2 ? 2 : 1;
   }
@@ -243,25 +203,26 @@ int Run(const std::vector<std::string> &args) {
   // The library's reasons are collected so that a failure can show them
   // without -v.
   std::vector<std::string> log, files;
-  Staging stage(o.out);
-  bool ok = !stage.Path().empty();
-  if (!ok) log.push_back("cannot make a staging directory beside " + o.out + ": " + std::strerror(errno));
+  StagedOutput stage(o.out);
+  std::string error;
+  bool ok = stage.Open(&error);
+  if (!ok) log.push_back("cannot make a staging directory for " + o.out + ": " + error);
   if (ok) {
-    if (!Verbose()) Tvx_SetLogSink(Capture, &log);
+    LogLines capture;
     ok = AutoInstall_PrepareAnswerFileEx_Linux(
-        guess.guestOS, guess.version, stage.Path().c_str(), o.user.c_str(), o.fullName.c_str(),
+        guess.guestOS, guess.version, stage.dir().c_str(), o.user.c_str(), o.fullName.c_str(),
         o.password.c_str(), (o.haveRoot ? o.rootPassword : o.password).c_str(),
         o.haveKey ? o.key.c_str() : nullptr, o.powerOff, 0, o.nvme);
-    if (!Verbose()) Tvx_SetLogSink(nullptr, nullptr);
+    log = capture.lines;
     if (!ok && log.empty()) {
       log.push_back(std::string("no Linux answer file is made for ") + guess.guestOS);
     }
   }
-  std::string error;
-  if (ok && !stage.Commit(o.out, &files, &error)) {
+  if (ok && !stage.Commit(&error)) {
     ok = false;
     log.push_back("cannot move the answer file into " + o.out + ": " + error);
   }
+  if (ok) files = FilesBelow(stage.committed());
   ok = ok && ContinueWithMedia(o.image, guess, o.out, o.media, o.json, &files, &log);
 
   const char *versionName =

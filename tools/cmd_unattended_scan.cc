@@ -101,9 +101,9 @@ int Run(const std::vector<std::string> &args) {
   bool ok;
   std::vector<std::string> log;
   {
-    LogCapture capture;
+    LogLines capture;
     ok = ScanMedium(medium, out, guess.guestOS, v, isolinuxBin);
-    log = capture.Lines();
+    log = capture.lines;
   }
   namespace fs = std::filesystem;
   std::vector<std::string> files;

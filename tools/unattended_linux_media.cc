@@ -11,6 +11,7 @@
 #include "tvx_autoinstall.h"
 #include "tvx_autoinstall_linux_media.h"
 #include "tvx_log.h"
+#include "staged_output.h"
 
 namespace tvxcli {
 
@@ -76,31 +77,28 @@ bool ScanMedium(const std::string &medium, const std::string &outDir, const char
 
 namespace {
 
-// MakeBootCd stages the boot tree (answer file and tools included) inside
-// the media directory, on the same file system, and masters it into
-// autoinst.iso; the tree is gone afterwards either way.
+namespace fs = std::filesystem;
+
+// MakeBootCd builds the boot tree (answer file and tools included) in the
+// staging directory and masters it into autoinst.iso there.
 bool MakeBootCd(const std::string &medium, const GuessResult &guess,
-                const std::string &answerFile, const LinuxMediaOptions &o) {
-  namespace fs = std::filesystem;
+                const std::string &answerFile, const LinuxMediaOptions &o,
+                const std::string &stage) {
   std::string mkisofs = o.mkisofs.empty() ? DefaultMkisofs() : o.mkisofs;
   if (mkisofs.empty()) {
     std::fprintf(stderr, "tvxguest: no ISO mastering tool found (genisoimage, xorrisofs)\n");
     return false;
   }
-  std::string tree = (fs::path(o.mediaDir) / ".autoinst-tree.XXXXXX").string();
-  if (::mkdtemp(tree.data()) == nullptr) {
-    std::fprintf(stderr, "tvxguest: cannot create a directory in %s\n", o.mediaDir.c_str());
-    return false;
-  }
+  std::string tree = (fs::path(stage) / "tree").string();
   std::error_code ec;
-  if (!answerFile.empty()) fs::copy_file(answerFile, fs::path(tree) / "ks.cfg", ec);
-  bool ok = !ec && ScanMedium(medium, tree, guess.guestOS, guess.version, o.isolinuxBin) &&
-            (o.toolsDir.empty() || AutoInstall_AddTools_Linux(tree.c_str(), o.toolsDir.c_str()));
-  if (!ok) {
-    fs::remove_all(tree, ec);
-    return false;
+  fs::create_directory(tree, ec);
+  if (!ec && !answerFile.empty()) fs::copy_file(answerFile, fs::path(tree) / "ks.cfg", ec);
+  if (!ec && ScanMedium(medium, tree, guess.guestOS, guess.version, o.isolinuxBin) &&
+      (o.toolsDir.empty() || AutoInstall_AddTools_Linux(tree.c_str(), o.toolsDir.c_str()))) {
+    return AutoInstall_MasterISO(tree.c_str(), mkisofs.c_str(), stage.c_str());  // takes the tree
   }
-  return AutoInstall_MasterISO(tree.c_str(), mkisofs.c_str(), o.mediaDir.c_str());
+  fs::remove_all(tree, ec);
+  return false;
 }
 
 }  // namespace
@@ -108,29 +106,31 @@ bool MakeBootCd(const std::string &medium, const GuessResult &guess,
 bool MakeLinuxMedia(const std::string &medium, const GuessResult &guess,
                     const std::string &answerDir, const LinuxMediaOptions &o,
                     std::vector<std::string> *out_files, std::vector<std::string> *out_notes) {
-  namespace fs = std::filesystem;
-  std::error_code ec;
-  fs::create_directories(o.mediaDir, ec);
-  std::string iso = (fs::path(o.mediaDir) / "autoinst.iso").string();
-  if (!AutoInstall_NeedsFloppy_Linux(guess.guestOS)) {
-    if (!MakeBootCd(medium, guess, (fs::path(answerDir) / "ks.cfg").string(), o)) return false;
-    out_files->push_back(iso);
-    return true;
-  }
-  if (!AutoInstall_MakeFloppyImg_Linux(answerDir.c_str(), o.mediaDir.c_str(),
-                                       o.templateDir.c_str(), guess.guestOS)) {
+  StagedOutput stage(o.mediaDir);
+  std::string err;
+  if (!stage.Open(&err)) {
+    std::fprintf(stderr, "tvxguest: %s\n", err.c_str());
     return false;
   }
-  out_files->push_back((fs::path(o.mediaDir) / "autoinst.flp").string());
-  // The floppy guest boots the same kind of CD, whose arguments send the
-  // installer to the floppy; without one the arguments are typed at the
-  // medium's own boot prompt.
-  if (MakeBootCd(medium, guess, "", o)) {
-    out_files->push_back(iso);
+  bool ok;
+  if (!AutoInstall_NeedsFloppy_Linux(guess.guestOS)) {
+    ok = MakeBootCd(medium, guess, (fs::path(answerDir) / "ks.cfg").string(), o, stage.dir());
   } else {
-    out_notes->push_back("no boot CD: the medium's isolinux boot tree could not be copied");
+    ok = AutoInstall_MakeFloppyImg_Linux(answerDir.c_str(), stage.dir().c_str(),
+                                         o.templateDir.c_str(), guess.guestOS);
+    // The floppy guest boots the same kind of CD, whose arguments send the
+    // installer to the floppy; without one the arguments are typed at the
+    // medium's own boot prompt.
+    if (ok && !MakeBootCd(medium, guess, "", o, stage.dir())) {
+      out_notes->push_back("no boot CD: the medium's isolinux boot tree could not be copied");
+    }
   }
-  return true;
+  if (ok && !stage.Commit(&err)) {
+    std::fprintf(stderr, "tvxguest: %s\n", err.c_str());
+    ok = false;
+  }
+  if (ok) out_files->insert(out_files->end(), stage.committed().begin(), stage.committed().end());
+  return ok;
 }
 
 bool ContinueWithMedia(const std::string &medium, const GuessResult &guess,
@@ -138,29 +138,14 @@ bool ContinueWithMedia(const std::string &medium, const GuessResult &guess,
                        std::vector<std::string> *files, std::vector<std::string> *log) {
   if (o.mediaDir.empty()) return true;
   std::vector<std::string> notes;
-  LogCapture capture;
+  LogLines capture;
   bool ok = MakeLinuxMedia(medium, guess, answerDir, o, files, &notes);
-  log->insert(log->end(), capture.Lines().begin(), capture.Lines().end());
+  log->insert(log->end(), capture.lines.begin(), capture.lines.end());
   for (const std::string &note : notes) {
     log->push_back("note: " + note);
     if (!json) std::fprintf(stderr, "tvxguest: note: %s\n", note.c_str());
   }
   return ok;
-}
-
-namespace {
-void Capture(TvxLogLevel, const char *text, void *ctx) {
-  std::string line = text;
-  if (!line.empty() && line.back() == '\n') line.pop_back();
-  static_cast<std::vector<std::string> *>(ctx)->push_back(line);
-}
-}  // namespace
-
-LogCapture::LogCapture() : active_(!Verbose()) {
-  if (active_) Tvx_SetLogSink(Capture, &lines_);
-}
-LogCapture::~LogCapture() {
-  if (active_) Tvx_SetLogSink(nullptr, nullptr);
 }
 
 }  // namespace tvxcli

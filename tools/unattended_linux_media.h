@@ -6,6 +6,7 @@
 #include <string>
 #include <vector>
 
+#include "tools_common.h"  // LogLines, with which the callers collect the library's lines
 #include "tvx_guess.h"
 
 namespace tvxcli {
@@ -43,8 +44,10 @@ bool ScanMedium(const std::string &medium, const std::string &outDir, const char
 // `medium` (image or directory) with ks.cfg and the tools, mastered into
 // autoinst.iso; for floppy guests autoinst.flp and, when the medium boots
 // through isolinux, an autoinst.iso whose arguments point at the floppy (its
-// absence is only a note). Appends the files made to `out_files`; false on
-// failure (the library's log lines say why).
+// absence is only a note). Everything is made in a staging directory beside
+// mediaDir and moved in at the end, so a failure adds nothing there.
+// Appends the files made to `out_files`; false on failure (the library's log
+// lines say why).
 bool MakeLinuxMedia(const std::string &medium, const GuessResult &guess,
                     const std::string &answerDir, const LinuxMediaOptions &o,
                     std::vector<std::string> *out_files, std::vector<std::string> *out_notes);
@@ -56,20 +59,5 @@ bool MakeLinuxMedia(const std::string &medium, const GuessResult &guess,
 bool ContinueWithMedia(const std::string &medium, const GuessResult &guess,
                        const std::string &answerDir, const LinuxMediaOptions &o, bool json,
                        std::vector<std::string> *files, std::vector<std::string> *log);
-
-// LogCapture collects the library's log lines while it lives (unless -v
-// shows them as they come).
-class LogCapture {
- public:
-  LogCapture();
-  ~LogCapture();
-  LogCapture(const LogCapture &) = delete;
-  LogCapture &operator=(const LogCapture &) = delete;
-  const std::vector<std::string> &Lines() const { return lines_; }
-
- private:
-  std::vector<std::string> lines_;
-  bool active_;
-};
 
 }  // namespace tvxcli

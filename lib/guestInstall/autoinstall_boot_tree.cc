@@ -189,10 +189,11 @@ class DiskMedium : public Medium {
     }
     out->assign(kMaxConfigBytes, '\0');
     size_t n = 0;
-    if (!PreadAll(fd.get(), out->data(), out->size(), 0, &n) || n == 0) {
+    if (!PreadAll(fd.get(), out->data(), out->size(), 0, &n)) {
       Log("%s: FileIO_Read failed\n", kParseDisk);
       return false;
     }
+    // An empty file is read fine: it just holds no entry.
     out->resize(n);
     return true;
   }

@@ -28,8 +28,7 @@ constexpr size_t kDigest = 32;
 constexpr size_t kResultMax = 3 + 7 + 9 + 1 + kSaltMax + 1 + 43;
 
 constexpr char kB64[] = "./0123456789ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz";
-constexpr char kSaltAlphabet[] =
-    "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789./";
+constexpr char kSaltAlphabet[] = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789./";
 
 }  // namespace
 
@@ -37,7 +36,7 @@ constexpr char kSaltAlphabet[] =
 // Only plain digits count as N (no sign, no blanks, at least one digit), so
 // "rounds=$" stays salt text rather than meaning zero rounds.
 CryptSalt ParseCryptSalt(const char *salt) {
-  CryptSalt spec;
+  CryptSalt parsed;
   if (std::strncmp(salt, kSaltPrefix, sizeof kSaltPrefix - 1) == 0) salt += sizeof kSaltPrefix - 1;
   if (std::strncmp(salt, kRoundsPrefix, sizeof kRoundsPrefix - 1) == 0) {
     const char *num = salt + sizeof kRoundsPrefix - 1;
@@ -47,14 +46,14 @@ CryptSalt ParseCryptSalt(const char *salt) {
       n = n > kRoundsMax ? n : n * 10 + static_cast<size_t>(*p - '0');  // saturates above max
     }
     if (p != num && *p == '$') {
-      spec.rounds = n < kRoundsMin ? kRoundsMin : n > kRoundsMax ? kRoundsMax : n;
-      spec.customRounds = true;
+      parsed.rounds = n < kRoundsMin ? kRoundsMin : n > kRoundsMax ? kRoundsMax : n;
+      parsed.customRounds = true;
       salt = p + 1;
     }
   }
   size_t len = std::strcspn(salt, "$");
-  spec.salt = std::string_view(salt, len < kSaltMax ? len : kSaltMax);
-  return spec;
+  parsed.salt = std::string_view(salt, len < kSaltMax ? len : kSaltMax);
+  return parsed;
 }
 
 namespace {
@@ -90,9 +89,9 @@ struct Work {
 
 // Crypt writes the full result (at most kResultMax characters, no NUL) into
 // `out` and returns its length.
-size_t Crypt(std::string_view key, const CryptSalt &spec, char out[kResultMax]) {
+size_t Crypt(std::string_view key, const CryptSalt &parsed, char out[kResultMax]) {
   Work w;
-  const std::string_view salt = spec.salt;
+  const std::string_view salt = parsed.salt;
   const size_t klen = key.size();
 
   // B = H(key salt key).
@@ -133,7 +132,7 @@ size_t Crypt(std::string_view key, const CryptSalt &spec, char out[kResultMax]) 
   w.ctx.Final(w.b);
   std::memcpy(w.s, w.b, salt.size());
 
-  for (size_t i = 0; i < spec.rounds; ++i) {
+  for (size_t i = 0; i < parsed.rounds; ++i) {
     w.ctx.Init();
     if ((i & 1) != 0) {
       w.ctx.Update(w.p, klen);
@@ -156,9 +155,9 @@ size_t Crypt(std::string_view key, const CryptSalt &spec, char out[kResultMax]) 
     len += text.size();
   };
   put(kSaltPrefix);
-  if (spec.customRounds) {
+  if (parsed.customRounds) {
     char digits[24];
-    int n = std::snprintf(digits, sizeof digits, "%s%zu$", kRoundsPrefix, spec.rounds);
+    int n = std::snprintf(digits, sizeof digits, "%s%zu$", kRoundsPrefix, parsed.rounds);
     put(std::string_view(digits, static_cast<size_t>(n)));
   }
   put(salt);

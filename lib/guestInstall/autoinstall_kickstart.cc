@@ -4,7 +4,6 @@
 // guest identifier and its version class, together with the template, the
 // package list and the kernel argument that lets the installer find ks.cfg.
 #include <cstring>
-#include <initializer_list>
 
 #include "lib/guestInstall/autoinstall_linux_internal.h"
 #include "lib/guestInstall/autoinstall_linux_templates.h"
@@ -13,43 +12,42 @@
 namespace tvx::autoinstall {
 
 // Lines 1 to 13 are shared by the three templates.
-#define TVX_KICKSTART_HEAD                                 \
-  "lang en_US\n"                                           \
-  "%slangsupport --default en_US\n"                        \
-  "network --bootproto dhcp\n"                             \
-  "cdrom\n"                                                \
-  "keyboard us\n"                                          \
-  "zerombr %syes\n"                                        \
-  "clearpart --all --initlabel\n"                          \
-  "part /boot --size 300\n"                                \
-  "part swap --recommended\n"                              \
-  "part / --size 3000 --grow\n"                            \
-  "%spart biosboot --fstype=biosboot --size=1\n"           \
-  "install\n"                                              \
-  "%smouse generic3ps/2\n"                                 \
-  "firstboot --disable\n"                                  \
-  "firewall --enabled\n"                                   \
-  "timezone --utc America/Los_Angeles\n"                   \
-  "xconfig --startxonboot %s--resolution=800x600\n"        \
-  "rootpw --iscrypted %s\n"                                \
-  "%s\n"                                                   \
-  "auth --useshadow --enablemd5\n"                         \
-  "bootloader --location=mbr\n"                            \
-  "%skey %s\n"                                             \
-  "%%packages%s\n"                                         \
-  "%spython\n"                                             \
-  "%s\n"                                                   \
-  "%s%%end\n"                                              \
+#define TVX_KICKSTART_HEAD                          \
+  "lang en_US\n"                                    \
+  "%slangsupport --default en_US\n"                 \
+  "network --bootproto dhcp\n"                      \
+  "cdrom\n"                                         \
+  "keyboard us\n"                                   \
+  "zerombr %syes\n"                                 \
+  "clearpart --all --initlabel\n"                   \
+  "part /boot --size 300\n"                         \
+  "part swap --recommended\n"                       \
+  "part / --size 3000 --grow\n"                     \
+  "%spart biosboot --fstype=biosboot --size=1\n"    \
+  "install\n"                                       \
+  "%smouse generic3ps/2\n"                          \
+  "firstboot --disable\n"                           \
+  "firewall --enabled\n"                            \
+  "timezone --utc America/Los_Angeles\n"            \
+  "xconfig --startxonboot %s--resolution=800x600\n" \
+  "rootpw --iscrypted %s\n"                         \
+  "%s\n"                                            \
+  "auth --useshadow --enablemd5\n"                  \
+  "bootloader --location=mbr\n"                     \
+  "%skey %s\n"                                      \
+  "%%packages%s\n"                                  \
+  "%spython\n"                                      \
+  "%s\n"                                            \
+  "%s%%end\n"                                       \
   "%%post\n"
 
-#define TVX_KICKSTART_USER_LINES           \
-  "/usr/sbin/adduser %s\n"                 \
+#define TVX_KICKSTART_USER_LINES \
+  "/usr/sbin/adduser %s\n"       \
   "/usr/sbin/usermod -p '%s' %s\n"
 
 // 1: the tools install from the copied tools CD at the first boot, in text
 // mode, and the graphical boot comes back afterwards.
-const char kKickstartTemplate1[] =
-    TVX_KICKSTART_HEAD
+const char kKickstartTemplate1[] = TVX_KICKSTART_HEAD
     "for f in /boot/grub/menu.lst /boot/grub/grub.conf /boot/grub2/grub.conf; do\n"
     "  if [ -f \"$f\" ]; then cp -p \"$f\" \"$f.bak\"; sed -i -e 's/ rhgb//' \"$f\"; fi\n"
     "done\n"
@@ -59,8 +57,8 @@ const char kKickstartTemplate1[] =
     "tarvex_selinux=$(getenforce 2>/dev/null)\n"
     "setenforce 0 2>/dev/null\n"
     "mkdir -p /tmp/tarvex-toolsmnt0\n"
-    "for i in hda sr0 scd0; do mount -t iso9660 /dev/$i /tmp/tarvex-toolsmnt0 && break; done\n"
-    TVX_TOOLS_COPY_FROM_MOUNT
+    "for i in hda sr0 scd0; do mount -t iso9660 /dev/$i /tmp/tarvex-toolsmnt0 && break; "
+    "done\n" TVX_TOOLS_COPY_FROM_MOUNT
     "eject sr0\n"
     "eject sr1\n"
     "./run_upgrader.sh\n"
@@ -77,17 +75,14 @@ const char kKickstartTemplate1[] =
     "chmod 755 /etc/rc.d/rc.local\n"
     "if [ -d /run/systemd/system ] || command -v systemctl >/dev/null 2>&1; then\n"
     "  systemctl enable rc-local.service\n"
-    "fi\n"
-    TVX_KICKSTART_USER_LINES
+    "fi\n" TVX_KICKSTART_USER_LINES
     "/usr/bin/chfn -f \"%s\" %s\n"
     "/bin/echo done\n"
     "%s%%end\n";
 
 // 2: the tools come from the distribution's repositories once the network
 // answers; the full name is left to the first login.
-const char kKickstartTemplate2[] =
-    TVX_KICKSTART_HEAD
-    TVX_KICKSTART_USER_LINES
+const char kKickstartTemplate2[] = TVX_KICKSTART_HEAD TVX_KICKSTART_USER_LINES
     "#/usr/bin/chfn -f \"%s\" %s\n"
     "mkdir -p /var/log/tarvex\n"
     "cat > /etc/rc.d/rc.local <<'TARVEX_EOF'\n"
@@ -115,9 +110,7 @@ const char kKickstartTemplate2[] =
 
 // 3: the tools package is part of the install; the first boot into the
 // graphical run level only tells the host that the install is over.
-const char kKickstartTemplate3[] =
-    TVX_KICKSTART_HEAD
-    TVX_KICKSTART_USER_LINES
+const char kKickstartTemplate3[] = TVX_KICKSTART_HEAD TVX_KICKSTART_USER_LINES
     "/usr/bin/chfn -f \"%s\" %s\n"
     "if [ -f /etc/rc.d/rc.local ]; then mv /etc/rc.d/rc.local /etc/rc.d/rc.local.00; fi\n"
     "mkdir -p /var/log/tarvex /etc/rc.d/rc5.d\n"
@@ -139,16 +132,15 @@ const char kKickstartTemplate3[] =
 
 namespace {
 
-#define TVX_GNOME                                                                \
+#define TVX_GNOME                                                          \
   "@ X Window System\n@ GNOME Desktop Environment\n@ Graphical Internet\n" \
   "@ Development Tools\n"
-#define TVX_F18_GROUPS                                                                        \
-  "@base-x\n@core\n@development-tools\n@dial-up\n@firefox\n@fonts\n@gnome-desktop\n"         \
+#define TVX_F18_GROUPS                                                               \
+  "@base-x\n@core\n@development-tools\n@dial-up\n@firefox\n@fonts\n@gnome-desktop\n" \
   "@hardware-support\n@input-methods\n@libreoffice\n@multimedia\n@printing\n@standard\n"
 #define TVX_EL7_HEAD "gcc\nmake\npatch\nbinutils\nkernel-devel\nftp\n@base\n@core\nopen-tvx-tools\n"
-#define TVX_EL7_DESKTOP_1                                                      \
-  "@guest-desktop-agents\n@desktop-debugging\n@dial-up\n"
-#define TVX_EL7_DESKTOP_2                                                      \
+#define TVX_EL7_DESKTOP_1 "@guest-desktop-agents\n@desktop-debugging\n@dial-up\n"
+#define TVX_EL7_DESKTOP_2                                                       \
   "@fonts\n@gnome-desktop\n@input-methods\n@internet-browser\n@java-platform\n" \
   "@multimedia\n@network-file-system-client\n@print-client\n"
 
@@ -180,13 +172,6 @@ constexpr char kF22[] =
 constexpr char kKsCdrom[] = "ks=cdrom:/ks.cfg";
 constexpr char kKsDevCdrom[] = "ks=cdrom:/dev/cdrom:/ks.cfg";
 
-bool IsVersion(uint32_t version, std::initializer_list<GuessVersion> any) {
-  for (GuessVersion v : any) {
-    if (version == static_cast<uint32_t>(v)) return true;
-  }
-  return false;
-}
-
 // Fedora 14 to 29-and-higher are consecutive classes; their installers
 // take %end and want a BIOS boot partition on GPT disks.
 bool IsFedora14OrLater(uint32_t version) {
@@ -194,8 +179,8 @@ bool IsFedora14OrLater(uint32_t version) {
 }
 
 const char *VersionRule(uint32_t version) {
-  return IsVersion(version, {GUESS_VERSION_FEDORA_17, GUESS_VERSION_FEDORA_18,
-                             GUESS_VERSION_FEDORA_19_TO_20})
+  return IsVersionIn(version, {GUESS_VERSION_FEDORA_17, GUESS_VERSION_FEDORA_18,
+                               GUESS_VERSION_FEDORA_19_TO_20})
              ? kKsDevCdrom
              : kKsCdrom;
 }
@@ -210,13 +195,20 @@ struct Choice {
 
 int CentosMajor(uint32_t version) {
   switch (version) {
-    case GUESS_VERSION_CENTOS_3: return 3;
-    case GUESS_VERSION_CENTOS_4: return 4;
-    case GUESS_VERSION_CENTOS_5: return 5;
-    case GUESS_VERSION_CENTOS_6: return 6;
-    case GUESS_VERSION_CENTOS_7: return 7;
-    case GUESS_VERSION_CENTOS_8: return 8;
-    default: return 0;
+    case GUESS_VERSION_CENTOS_3:
+      return 3;
+    case GUESS_VERSION_CENTOS_4:
+      return 4;
+    case GUESS_VERSION_CENTOS_5:
+      return 5;
+    case GUESS_VERSION_CENTOS_6:
+      return 6;
+    case GUESS_VERSION_CENTOS_7:
+      return 7;
+    case GUESS_VERSION_CENTOS_8:
+      return 8;
+    default:
+      return 0;
   }
 }
 
@@ -238,14 +230,22 @@ Choice Choose(const KickstartGuest &g, uint32_t version, const char *guestOS) {
   }
   const char *f18 = std::strstr(guestOS, "64") != nullptr ? kF18x64 : kF18;
   switch (version) {
-    case GUESS_VERSION_FEDORA_14_TO_16: return {kKickstartTemplate1, kGnomeFonts, true, true, kKsCdrom};
-    case GUESS_VERSION_FEDORA_17: return {kKickstartTemplate1, kGnomeFonts, true, true, kKsDevCdrom};
-    case GUESS_VERSION_FEDORA_18: return {kKickstartTemplate1, f18, true, true, kKsDevCdrom};
-    case GUESS_VERSION_FEDORA_19_TO_20: return {kKickstartTemplate2, f18, true, true, kKsDevCdrom};
-    case GUESS_VERSION_FEDORA_21: return {kKickstartTemplate2, kF21, true, true, kKsCdrom};
-    case GUESS_VERSION_FEDORA_22_TO_28: return {kKickstartTemplate2, kF22, true, true, kKsCdrom};
-    case GUESS_VERSION_FEDORA_29_OR_HIGHER: return {kKickstartTemplate2, kF22, true, false, kKsCdrom};
-    default: return {kKickstartTemplate1, kGnome, false, true, rule};
+    case GUESS_VERSION_FEDORA_14_TO_16:
+      return {kKickstartTemplate1, kGnomeFonts, true, true, kKsCdrom};
+    case GUESS_VERSION_FEDORA_17:
+      return {kKickstartTemplate1, kGnomeFonts, true, true, kKsDevCdrom};
+    case GUESS_VERSION_FEDORA_18:
+      return {kKickstartTemplate1, f18, true, true, kKsDevCdrom};
+    case GUESS_VERSION_FEDORA_19_TO_20:
+      return {kKickstartTemplate2, f18, true, true, kKsDevCdrom};
+    case GUESS_VERSION_FEDORA_21:
+      return {kKickstartTemplate2, kF21, true, true, kKsCdrom};
+    case GUESS_VERSION_FEDORA_22_TO_28:
+      return {kKickstartTemplate2, kF22, true, true, kKsCdrom};
+    case GUESS_VERSION_FEDORA_29_OR_HIGHER:
+      return {kKickstartTemplate2, kF22, true, false, kKsCdrom};
+    default:
+      return {kKickstartTemplate1, kGnome, false, true, rule};
   }
 }
 
@@ -281,9 +281,8 @@ bool MakeKickstart(const char *guestOS, uint32_t version, const KickstartAnswers
                     {oldSwitch, modernSwitch, IsFedora14OrLater(version) ? "" : "#", oldSwitch,
                      modernSwitch, a.rootCrypt, a.powerOff ? "poweroff" : "reboot",
                      g.rhel5 ? "" : "#", hasKey ? a.installationKey : "--skip",
-                     g.old ? " --resolvedeps" : "", c.pythonLine ? "" : "#", c.packages,
-                     endSwitch, a.userName, a.userCrypt, a.userName, a.fullNameShell,
-                     a.userName, endSwitch},
+                     g.old ? " --resolvedeps" : "", c.pythonLine ? "" : "#", c.packages, endSwitch,
+                     a.userName, a.userCrypt, a.userName, a.fullNameShell, a.userName, endSwitch},
                     out)) {
     return false;
   }

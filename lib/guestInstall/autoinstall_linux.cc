@@ -2,7 +2,6 @@
 // guest's installer filled with the typed answers, each escaped for the
 // language of the spot it lands in, and written in one crash-safe step.
 #include <cstring>
-#include <initializer_list>
 #include <string>
 
 #include "lib/guestInstall/autoinstall_internal.h"
@@ -39,13 +38,6 @@ struct SecretText {
   ~SecretText() { explicit_bzero(text.data(), text.size()); }
 };
 
-bool IsIn(uint32_t version, std::initializer_list<GuessVersion> any) {
-  for (GuessVersion v : any) {
-    if (version == static_cast<uint32_t>(v)) return true;
-  }
-  return false;
-}
-
 // ValidFullName: UTF-8 (shortest forms, no surrogates, no U+FFFE/U+FFFF,
 // which XML cannot carry), no control characters, no trailing backslash.
 bool ValidFullName(const char *text, const char **out_why) {
@@ -73,8 +65,8 @@ bool ValidFullName(const char *text, const char **out_why) {
       cp = (cp << 6) | (p[i + k] & 0x3f);
     }
     const uint32_t kMin[] = {0, 0x80, 0x800, 0x10000};
-    ok = ok && cp >= kMin[n] && cp <= 0x10ffff && !(cp >= 0xd800 && cp <= 0xdfff) &&
-         cp != 0xfffe && cp != 0xffff;
+    ok = ok && cp >= kMin[n] && cp <= 0x10ffff && !(cp >= 0xd800 && cp <= 0xdfff) && cp != 0xfffe &&
+         cp != 0xffff;
     if (!ok) {
       *out_why = "is not valid UTF-8 text";
       return false;
@@ -91,7 +83,8 @@ bool ValidFullName(const char *text, const char **out_why) {
 bool ValidInstallationKey(const char *key) {
   for (const char *p = key; *p != '\0'; ++p) {
     char c = *p;
-    bool ok = (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') || c == '-';
+    bool ok =
+        (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') || c == '-';
     if (!ok) return false;
   }
   return true;
@@ -108,19 +101,18 @@ bool Crypt(const char *password, std::string *out) {
 
 bool MakePreseed(uint32_t version, const char *userName, const std::string &fullName,
                  const std::string &userCrypt, Bool powerOff, Bool nvmeDisk, std::string *out) {
-  bool network = IsIn(version, {GUESS_VERSION_UBUNTU_SERVER_1404, GUESS_VERSION_UBUNTU_SERVER_1410,
-                                GUESS_VERSION_UBUNTU_SERVER_1504_OR_HIGHER,
-                                GUESS_VERSION_UBUNTU_1404, GUESS_VERSION_UBUNTU_1410,
-                                GUESS_VERSION_UBUNTU_1504_TO_2004,
-                                GUESS_VERSION_UBUNTU_2010_OR_HIGHER});
+  bool network =
+      IsVersionIn(version, {GUESS_VERSION_UBUNTU_SERVER_1404, GUESS_VERSION_UBUNTU_SERVER_1410,
+                            GUESS_VERSION_UBUNTU_SERVER_1504_OR_HIGHER, GUESS_VERSION_UBUNTU_1404,
+                            GUESS_VERSION_UBUNTU_1410, GUESS_VERSION_UBUNTU_1504_TO_2004,
+                            GUESS_VERSION_UBUNTU_2010_OR_HIGHER});
   const char *tmpl = network ? (nvmeDisk ? kPreseedNetworkNvme : kPreseedNetworkSda)
                              : (nvmeDisk ? kPreseedToolsCdNvme : kPreseedToolsCdSda);
   const char *flag = network ? "true" : "false";
   // A preseed value runs to the end of its line and is taken literally; the
   // full name was checked to be one line without a continuation backslash.
-  return FillTemplate(tmpl, {fullName, userName, userCrypt, powerOff ? "poweroff" : "reboot",
-                             flag, flag},
-                      out);
+  return FillTemplate(
+      tmpl, {fullName, userName, userCrypt, powerOff ? "poweroff" : "reboot", flag, flag}, out);
 }
 
 struct SuseChoice {
@@ -134,22 +126,17 @@ struct SuseChoice {
 #define TVX_SLES12_BASE TVX_P("32bit")
 
 SuseChoice ChooseSuse(const char *guestOS, uint32_t version) {
-  static constexpr char kSled12[] =
-      TVX_P("32bit") TVX_P("Minimal") TVX_P("apparmor") TVX_P("desktop-base")
-      TVX_P("desktop-gnome") TVX_P("documentation") TVX_P("gnome-basic")
-      TVX_P("sled-Minimal-32bit") TVX_P("sled-apparmor-32bit") TVX_P("sled-desktop-base-32bit")
-      TVX_P("sled-documentation-32bit") TVX_P("sled-x11") TVX_P("x11") TVX_P("Basis-Devel");
-  static constexpr char kSledOther[] =
-      TVX_P("default") TVX_P("desktop-gnome") TVX_P("Basis-Devel");
-  static constexpr char kSles12[] =
-      TVX_P("32bit") TVX_P("base") TVX_P("Minimal") TVX_P("apparmor") TVX_P("WBEM")
-      TVX_P("documentation") TVX_P("gnome-basic") TVX_P("x11") TVX_P("Basis-Devel");
+  static constexpr char kSled12[] = TVX_P("32bit") TVX_P("Minimal") TVX_P("apparmor")
+      TVX_P("desktop-base") TVX_P("desktop-gnome") TVX_P("documentation") TVX_P("gnome-basic")
+          TVX_P("sled-Minimal-32bit") TVX_P("sled-apparmor-32bit") TVX_P("sled-desktop-base-32bit")
+              TVX_P("sled-documentation-32bit") TVX_P("sled-x11") TVX_P("x11") TVX_P("Basis-Devel");
+  static constexpr char kSledOther[] = TVX_P("default") TVX_P("desktop-gnome") TVX_P("Basis-Devel");
+  static constexpr char kSles12[] = TVX_P("32bit") TVX_P("base") TVX_P("Minimal") TVX_P("apparmor")
+      TVX_P("WBEM") TVX_P("documentation") TVX_P("gnome-basic") TVX_P("x11") TVX_P("Basis-Devel");
   static constexpr char kSles11[] = TVX_P("base") TVX_P("gnome") TVX_P("Basis-Devel");
   static constexpr char kSles[] = TVX_P("default") TVX_P("gnome") TVX_P("Basis-Devel");
-  static constexpr char kOpenSuse13[] =
-      TVX_P("kde") TVX_P("enhanced_base") TVX_P("devel_C_C++");
-  static constexpr char kOpenSuse[] =
-      TVX_P("kde4") TVX_P("enhanced_base") TVX_P("devel_C_C++");
+  static constexpr char kOpenSuse13[] = TVX_P("kde") TVX_P("enhanced_base") TVX_P("devel_C_C++");
+  static constexpr char kOpenSuse[] = TVX_P("kde4") TVX_P("enhanced_base") TVX_P("devel_C_C++");
   static constexpr char kKernelDevel[] = "      <package>kernel-desktop-devel</package>\n";
 
   bool sles12 = StrUtil_StartsWith(guestOS, "sles12");
@@ -177,16 +164,16 @@ bool MakeAutoYast(const char *guestOS, uint32_t version, AutoInstallLinuxKind ki
   std::string forename = EscapeCdata(fullName);
   const char *halt = powerOff ? "true" : "false";
   if (c.templateText == kAutoYastTemplateB) {
-    return FillTemplate(c.templateText, {c.patterns, c.packages, halt, c.displayManager,
-                                         rootCrypt, userCrypt, userName, forename,
-                                         c.displayManager},
+    return FillTemplate(c.templateText,
+                        {c.patterns, c.packages, halt, c.displayManager, rootCrypt, userCrypt,
+                         userName, forename, c.displayManager},
                         out);
   }
-  return FillTemplate(c.templateText,
-                      {c.patterns, c.packages, halt, c.displayManager, rootCrypt, userCrypt,
-                       userName, forename, c.displayManager,
-                       kind == AUTOINSTALL_LINUX_SLES10 ? "hda" : "sr0"},
-                      out);
+  return FillTemplate(
+      c.templateText,
+      {c.patterns, c.packages, halt, c.displayManager, rootCrypt, userCrypt, userName, forename,
+       c.displayManager, kind == AUTOINSTALL_LINUX_SLES10 ? "hda" : "sr0"},
+      out);
 }
 
 // Prepare does the work of AutoInstall_PrepareAnswerFileEx_Linux.
@@ -227,8 +214,8 @@ bool Prepare(const char *guestOS, uint32_t version, const char *outputDir, const
     case AUTOINSTALL_LINUX_REDHAT: {
       if (!Crypt(userPassword, &userCrypt) || !Crypt(rootPassword, &rootCrypt)) break;
       std::string shellName = EscapeShellDoubleQuoted(fullName);
-      KickstartAnswers a{userName, shellName.c_str(), userCrypt.c_str(), rootCrypt.c_str(),
-                         installationKey, powerOff != 0};
+      KickstartAnswers a{userName,          shellName.c_str(), userCrypt.c_str(),
+                         rootCrypt.c_str(), installationKey,   powerOff != 0};
       filled = MakeKickstart(guestOS, version, a, &text.text, &argument);
       break;
     }
@@ -246,13 +233,13 @@ bool Prepare(const char *guestOS, uint32_t version, const char *outputDir, const
       // This installer takes the passwords in clear only.
       SecretText user(EscapePerlDoubleQuoted(userPassword));
       SecretText root(EscapePerlDoubleQuoted(rootPassword));
-      filled = FillTemplate(kAutoInstTemplate,
-                            {userName, EscapePerlDoubleQuoted(fullName), userName, user.text,
-                             root.text},
-                            &text.text);
+      filled = FillTemplate(
+          kAutoInstTemplate,
+          {userName, EscapePerlDoubleQuoted(fullName), userName, user.text, root.text}, &text.text);
       break;
     }
-    case AUTOINSTALL_LINUX_NONE: break;
+    case AUTOINSTALL_LINUX_NONE:
+      break;
   }
   if (!filled) {
     Log("%s: the answer file for %s could not be made\n", kFn, guestOS);
@@ -306,9 +293,8 @@ extern "C" TVX_EXPORT Bool AutoInstall_PrepareAnswerFileEx_Linux(
     const char *fullName, const char *userPassword, const char *rootPassword,
     const char *installationKey, Bool powerOff, uint32_t /*reserved*/, Bool nvmeDisk) {
   try {
-    return tvx::autoinstall::Prepare(guestOS, version, outputDir, userName, fullName,
-                                     userPassword, rootPassword, installationKey, powerOff,
-                                     nvmeDisk)
+    return tvx::autoinstall::Prepare(guestOS, version, outputDir, userName, fullName, userPassword,
+                                     rootPassword, installationKey, powerOff, nvmeDisk)
                ? TRUE
                : FALSE;
   } catch (...) {

@@ -4,6 +4,7 @@
 #pragma once
 
 #include <cstddef>
+#include <initializer_list>
 #include <string>
 #include <string_view>
 
@@ -80,6 +81,14 @@ struct KickstartAnswers {
 // `out` and names the kernel argument that finds it (a constant text).
 bool MakeKickstart(const char *guestOS, uint32_t version, const KickstartAnswers &answers,
                    std::string *out, const char **out_argument);
+
+// IsVersionIn: `version` (a GuessVersion value) is one of `any`.
+inline bool IsVersionIn(uint32_t version, std::initializer_list<GuessVersion> any) {
+  for (GuessVersion v : any) {
+    if (version == static_cast<uint32_t>(v)) return true;
+  }
+  return false;
+}
 
 // Escapes for the places a typed text lands in. Each returns a new text.
 std::string EscapeShellDoubleQuoted(const std::string &text);  // \ " $ `

@@ -10,14 +10,14 @@
 // Shell lines of the post-install scripts that copy the tools CD mounted at
 // /tmp/tarvex-toolsmnt0 to /opt/tarvex-tools-installer and give its files
 // back the long names the CD cannot carry; they end in that directory.
-#define TVX_TOOLS_COPY_FROM_MOUNT                                                 \
-  "rm -rf /opt/tarvex-tools-installer\n"                                          \
-  "cp -a /tmp/tarvex-toolsmnt0 /opt/tarvex-tools-installer\n"                     \
-  "umount /tmp/tarvex-toolsmnt0\n"                                                \
-  "cd /opt/tarvex-tools-installer || exit 1\n"                                    \
-  "mv upgra32 tarvex-tools-upgrader-32\n"                                         \
-  "mv upgra64 tarvex-tools-upgrader-64\n"                                         \
-  "mv upgrade.sh run_upgrader.sh\n"                                               \
+#define TVX_TOOLS_COPY_FROM_MOUNT                             \
+  "rm -rf /opt/tarvex-tools-installer\n"                      \
+  "cp -a /tmp/tarvex-toolsmnt0 /opt/tarvex-tools-installer\n" \
+  "umount /tmp/tarvex-toolsmnt0\n"                            \
+  "cd /opt/tarvex-tools-installer || exit 1\n"                \
+  "mv upgra32 tarvex-tools-upgrader-32\n"                     \
+  "mv upgra64 tarvex-tools-upgrader-64\n"                     \
+  "mv upgrade.sh run_upgrader.sh\n"                           \
   "chmod 755 tarvex-tools-upgrader-32 tarvex-tools-upgrader-64 run_upgrader.sh\n"
 
 namespace tvx::autoinstall {

@@ -45,9 +45,10 @@
  *  g. The ISO open mode handed out is the name format to read the image
  *     with: ISO9660_FORMAT_JOLIET (2) for Windows guests,
  *     ISO9660_FORMAT_ROCKRIDGE (4) otherwise (tvx_iso9660.h).
- *  h. Images read through Iso9660_OpenWithReader are read in whole 2048-byte
- *     sectors, so their hash data must use a block size dividing 2048 (512,
- *     1024 or 2048); larger blocks work for direct reads only.
+ *  h. Iso9660_OpenWithReader hands its callbacks whole aligned 4096-byte
+ *     pieces (2048 at the end of an image of an odd number of sectors), so
+ *     hash data with any block size dividing 4096 (512, 1024, 2048, 4096)
+ *     serves the ISO reader; other block sizes work for direct reads only.
  */
 #ifndef TVX_TOOLSISO_IMAGE_H
 #define TVX_TOOLSISO_IMAGE_H

@@ -175,11 +175,16 @@ typedef struct ToolsVersionReport {
 } ToolsVersionReport;
 
 /* ToolsVersion_GetStatusReport is ToolsVersion_GetStatus that also hands out
- * a report in *out_report (optional; free it with ToolsVersion_FreeReport). */
+ * a report in *out_report (optional; free it with ToolsVersion_FreeReport).
+ * `certFile` (optional; NULL: the installed maker certificates) names the
+ * maker certificates that the tools image's hash data and the AVR manifest
+ * must be signed under, as ToolsISO_GetImagePathEx takes it: for publishers
+ * checking their own signing keys. A host passes NULL. */
 TVX_EXPORT uint32_t ToolsVersion_GetStatusReport(const char *configPath, Dictionary *config,
                                                  const char *guestManifestPath,
                                                  const char *guestManifestText,
                                                  uint32_t toolsVersion, int32_t mode,
+                                                 const char *certFile,
                                                  ToolsVersionReport **out_report);
 /* ToolsVersion_FreeReport releases a report; NULL is harmless. */
 TVX_EXPORT void ToolsVersion_FreeReport(ToolsVersionReport *report);

@@ -27,8 +27,8 @@ void FillComponent(ToolsVersionComponent *out, const ComponentRow &row) {
 }
 
 void FreeComponent(ToolsVersionComponent *c) {
-  for (char *text : {c->name, c->guestVersion, c->hostVersion, c->avrMin, c->avrMax,
-                     c->avrIllegal}) {
+  for (char *text :
+       {c->name, c->guestVersion, c->hostVersion, c->avrMin, c->avrMax, c->avrIllegal}) {
     std::free(text);
   }
 }
@@ -66,16 +66,17 @@ TVX_EXPORT uint32_t ToolsVersion_GetStatusReport(const char *configPath, Diction
                                                  const char *guestManifestPath,
                                                  const char *guestManifestText,
                                                  uint32_t toolsVersion, int32_t mode,
+                                                 const char *certFile,
                                                  ToolsVersionReport **out_report) {
   if (out_report != nullptr) *out_report = nullptr;
   try {
     tvx::toolsversion::Report report;
+    report.certFile = certFile;
     // A missing configuration reads as an empty one: no guest OS, no files.
     tvx::toolsversion::DictPtr empty(config == nullptr ? Dictionary_Create() : nullptr);
     if (config == nullptr) config = empty.get();
     uint32_t status = tvx::toolsversion::GetStatus(configPath, config, guestManifestPath,
-                                                   guestManifestText, toolsVersion, mode,
-                                                   &report);
+                                                   guestManifestText, toolsVersion, mode, &report);
     if (out_report != nullptr) *out_report = MakeReport(report, status);
     return status;
   } catch (...) {
@@ -88,7 +89,7 @@ TVX_EXPORT uint32_t ToolsVersion_GetStatus(const char *configPath, Dictionary *c
                                            const char *guestManifestText, uint32_t toolsVersion,
                                            int32_t mode) {
   return ToolsVersion_GetStatusReport(configPath, config, guestManifestPath, guestManifestText,
-                                      toolsVersion, mode, nullptr);
+                                      toolsVersion, mode, nullptr, nullptr);
 }
 
 TVX_EXPORT void ToolsVersion_FreeReport(ToolsVersionReport *report) {
@@ -104,8 +105,8 @@ TVX_EXPORT Bool ToolsVersion_SaveXmlInfo(const char *configPath, const char *upd
                                          const char *manifestText, int32_t installError,
                                          int32_t updateCounter) {
   try {
-    return tvx::toolsversion::SaveXmlInfo(configPath, updateAgentXml, manifestText,
-                                          installError, updateCounter)
+    return tvx::toolsversion::SaveXmlInfo(configPath, updateAgentXml, manifestText, installError,
+                                          updateCounter)
                ? TRUE
                : FALSE;
   } catch (...) {
@@ -118,11 +119,11 @@ TVX_EXPORT const char *ToolsVersion_ComponentStatusText(uint32_t rating) {
 }
 
 TVX_EXPORT const char *ToolsVersion_StatusName(uint32_t status) {
-  static const char *const kNames[] = {
-      "TOOLS_STATUS_INVALID",       "TOOLS_STATUS_TOO_OLD",       "TOOLS_STATUS_SUPPORTED_OLD",
-      "TOOLS_STATUS_CURRENT",       "TOOLS_STATUS_SUPPORTED_NEW", "TOOLS_STATUS_TOO_NEW",
-      "TOOLS_STATUS_BLACKLISTED",   "TOOLS_STATUS_NOT_INSTALLED", "TOOLS_STATUS_NOT_APPLICABLE",
-      "TOOLS_STATUS_UNKNOWN"};
+  static const char *const kNames[] = {"TOOLS_STATUS_INVALID",        "TOOLS_STATUS_TOO_OLD",
+                                       "TOOLS_STATUS_SUPPORTED_OLD",  "TOOLS_STATUS_CURRENT",
+                                       "TOOLS_STATUS_SUPPORTED_NEW",  "TOOLS_STATUS_TOO_NEW",
+                                       "TOOLS_STATUS_BLACKLISTED",    "TOOLS_STATUS_NOT_INSTALLED",
+                                       "TOOLS_STATUS_NOT_APPLICABLE", "TOOLS_STATUS_UNKNOWN"};
   return status < sizeof kNames / sizeof kNames[0] ? kNames[status] : kNames[0];
 }
 

@@ -13,15 +13,21 @@ namespace tvx::toolsversion {
 
 namespace {
 
-constexpr std::array<const char *, 10> kRatingTexts = {
-    "blacklisted",   "too old", "too new",       "supported old", "supported new",
-    "current",       "additional in the guest",  "missing from the guest",
-    "not installed", "gone"};
+constexpr std::array<const char *, 10> kRatingTexts = {"blacklisted",
+                                                       "too old",
+                                                       "too new",
+                                                       "supported old",
+                                                       "supported new",
+                                                       "current",
+                                                       "additional in the guest",
+                                                       "missing from the guest",
+                                                       "not installed",
+                                                       "gone"};
 
 // The status a rating of the monolithic record gives (ratings 0 to 5 only).
-constexpr uint32_t kRatingToStatus[6] = {
-    TOOLS_STATUS_BLACKLISTED,   TOOLS_STATUS_TOO_OLD,       TOOLS_STATUS_TOO_NEW,
-    TOOLS_STATUS_SUPPORTED_OLD, TOOLS_STATUS_SUPPORTED_NEW, TOOLS_STATUS_CURRENT};
+constexpr uint32_t kRatingToStatus[6] = {TOOLS_STATUS_BLACKLISTED,   TOOLS_STATUS_TOO_OLD,
+                                         TOOLS_STATUS_TOO_NEW,       TOOLS_STATUS_SUPPORTED_OLD,
+                                         TOOLS_STATUS_SUPPORTED_NEW, TOOLS_STATUS_CURRENT};
 
 bool IllegalMatches(const ToolsVersionNumber &guest, const ToolsVersionNumber &illegal) {
   return !IsSet(illegal) || CompareToLimit(guest, illegal) == 0;
@@ -50,8 +56,8 @@ ComponentRow MakeRow(const std::string &name, const ComponentInfo &c) {
 void LogRow(const char *name, const char *status, const std::string &guest, char installed,
             const std::string &host, const std::string &min, const std::string &max,
             const std::string &illegal) {
-  TV_LOG("%-24s: %-11.11s %-16s %c %-16s %-16s %-16s %s\n", name, status, guest.c_str(),
-         installed, host.c_str(), min.c_str(), max.c_str(), illegal.c_str());
+  TV_LOG("%-24s: %-11.11s %-16s %c %-16s %-16s %-16s %s\n", name, status, guest.c_str(), installed,
+         host.c_str(), min.c_str(), max.c_str(), illegal.c_str());
 }
 
 void LogRow(const ComponentRow &r) {
@@ -132,14 +138,16 @@ ToolsComponentStatus RateComponent(const ComponentInfo &c) {
   }
   if (!IsSet(c.versionOnHost)) return TOOLS_COMPONENT_ADDITIONAL;
   int cmp = CompareToLimit(c.versionInGuest, c.versionOnHost);
-  return cmp > 0 ? TOOLS_COMPONENT_SUPPORTED_NEW
-                 : cmp < 0 ? TOOLS_COMPONENT_SUPPORTED_OLD : TOOLS_COMPONENT_CURRENT;
+  return cmp > 0   ? TOOLS_COMPONENT_SUPPORTED_NEW
+         : cmp < 0 ? TOOLS_COMPONENT_SUPPORTED_OLD
+                   : TOOLS_COMPONENT_CURRENT;
 }
 
 uint32_t EvaluateManifests(const char *hostPath, const char *avrPath, const Dictionary *guest,
                            Report *report) {
   LogSwitches switches;
-  TablePtr table = LoadManifests(hostPath, avrPath, guest, &switches);
+  TablePtr table = LoadManifests(hostPath, avrPath, guest, &switches,
+                                 report != nullptr ? report->certFile : nullptr);
   if (table == nullptr) return TOOLS_STATUS_UNKNOWN;
   return EvaluateTable(table.get(), switches, report);
 }
@@ -198,8 +206,8 @@ uint32_t EvaluateTable(HashTable *table, const LogSwitches &switches, Report *re
   }
 
   // Rules 1 to 3: the component buckets and the monolithic rating alike.
-  for (ToolsComponentStatus r : {TOOLS_COMPONENT_BLACKLISTED, TOOLS_COMPONENT_TOO_OLD,
-                                 TOOLS_COMPONENT_TOO_NEW}) {
+  for (ToolsComponentStatus r :
+       {TOOLS_COMPONENT_BLACKLISTED, TOOLS_COMPONENT_TOO_OLD, TOOLS_COMPONENT_TOO_NEW}) {
     const auto &bucket = buckets[r];
     if (m == r) {
       ReasonOf(report, kRatingTexts[r], "monolithic version", bucket);

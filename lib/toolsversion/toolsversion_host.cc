@@ -3,12 +3,12 @@
 // manifest from an image whose hash data or signature fails is never used),
 // and the signed AVR manifest beside the image.
 #include "lib/toolsversion/toolsversion_internal.h"
-#include "tvx_toolsiso.h"
-#include "tvx_toolsiso_image.h"
 #include "platform/file.h"
 #include "platform/str.h"
 #include "platform/vthread.h"
 #include "tvx_iso9660.h"
+#include "tvx_toolsiso.h"
+#include "tvx_toolsiso_image.h"
 
 namespace tvx::toolsversion {
 
@@ -45,7 +45,7 @@ struct ToolsImage {
   uint32_t openMode = 0;
 };
 
-bool GetToolsIsoPath(const Dictionary *config, ToolsImage *image) {
+bool GetToolsIsoPath(const Dictionary *config, const char *certFile, ToolsImage *image) {
   constexpr const char *kFn = "GetToolsIsoPath";
   CharPtr libDir(Dict_GetString(config, kDefaultLibDir, "libdir"));
   CharPtr guestOS(Dict_GetString(config, nullptr, "guestOS"));
@@ -55,8 +55,8 @@ bool GetToolsIsoPath(const Dictionary *config, ToolsImage *image) {
     TV_LOG("%s: Failed to get default libDir.\n", kFn);
   } else if (guestOS == nullptr) {
     TV_LOG("%s: Failed to find guestOS value.\n", kFn);
-  } else if (!ToolsISO_GetImagePath(libDir.get(), guestOS.get(), hint.get(), TRUE, &path,
-                                    &baseName, &image->openMode)) {
+  } else if (!ToolsISO_GetImagePathEx(libDir.get(), guestOS.get(), hint.get(), TRUE, certFile,
+                                      &path, &baseName, &image->openMode)) {
     TV_LOG("%s: Failed to get Tools ISO image path.\n", kFn);
   } else {
     image->path.reset(path);
@@ -68,11 +68,12 @@ bool GetToolsIsoPath(const Dictionary *config, ToolsImage *image) {
 }
 
 // ExtractHostManifest copies "manifest.txt" out of the verified image.
-bool ExtractHostManifest(const char *realPath, uint32_t openMode, const std::string &target) {
+bool ExtractHostManifest(const char *realPath, uint32_t openMode, const char *certFile,
+                         const std::string &target) {
   constexpr const char *kFn = "GetHostManifests";
   TV_LOG("%s: Extracting %s manifest file.\n", kFn, target.c_str());
   ToolsIsoLocalFile *handle = nullptr;
-  int opened = ToolsISO_LocalFileOpen(realPath, TRUE, &handle);
+  int opened = ToolsISO_LocalFileOpenEx(realPath, TRUE, certFile, &handle);
   if (opened != 0) {
     if (opened == 2) TV_LOG("Failed to verify signature for Tools ISO image.\n");
     return false;
@@ -105,7 +106,8 @@ uint32_t GetHostManifests(const Dictionary *config, const char *guestManifestPat
   ToolsImage image;
   bool fetched = false;
   std::string avrPath;
-  if (!target.empty() && GetToolsIsoPath(config, &image)) {
+  const char *certFile = report != nullptr ? report->certFile : nullptr;
+  if (!target.empty() && GetToolsIsoPath(config, certFile, &image)) {
     CharPtr realPath(ToolsISO_GetRealPath(image.path.get()));
     if (realPath != nullptr) {
       char *dir = nullptr;
@@ -114,7 +116,7 @@ uint32_t GetHostManifests(const Dictionary *config, const char *guestManifestPat
       CharPtr avr(Str_Asprintf(nullptr, "%s%s%s_%s_%s", imageDir.get(), "/", image.baseName.get(),
                                "avr", kManifestName));
       avrPath = avr.get();
-      fetched = ExtractHostManifest(realPath.get(), image.openMode, target);
+      fetched = ExtractHostManifest(realPath.get(), image.openMode, certFile, target);
     }
   }
   if (!fetched) {

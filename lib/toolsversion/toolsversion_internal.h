@@ -73,8 +73,8 @@ TablePtr NewComponentTable();
 ComponentInfo *LookupComponent(HashTable *table, const char *name);
 // HandleEntry applies one manifest entry. `switches` is given for the host
 // and AVR manifests only; faults are logged only then.
-void HandleEntry(HashTable *table, ToolsManifestKind kind, LogSwitches *switches,
-                 const char *name, const char *value);
+void HandleEntry(HashTable *table, ToolsManifestKind kind, LogSwitches *switches, const char *name,
+                 const char *value);
 // FillTable walks the loaded manifests into a new table: host, then AVR
 // (or, without one, the host versions as minimums), then the guest.
 TablePtr FillTable(const Dictionary *host, const Dictionary *avr, const Dictionary *guest,
@@ -83,7 +83,7 @@ TablePtr FillTable(const Dictionary *host, const Dictionary *avr, const Dictiona
 // manifest (optional path; checked against its ".sig") and the guest
 // dictionary (optional). Null when the host manifest cannot be loaded.
 TablePtr LoadManifests(const char *hostPath, const char *avrPath, const Dictionary *guest,
-                       LogSwitches *switches);
+                       LogSwitches *switches, const char *certFile = nullptr);
 
 // --- Status ----------------------------------------------------------------
 
@@ -96,6 +96,9 @@ struct ComponentRow {
 
 // What one status call found, for ToolsVersion_GetStatusReport.
 struct Report {
+  // In: the maker certificates to trust for the image and the AVR manifest
+  // (null: the installed ones).
+  const char *certFile = nullptr;
   bool evaluated = false;
   uint32_t manifestStatus = TOOLS_STATUS_UNKNOWN;
   bool savedStatus = false;
@@ -135,7 +138,7 @@ bool ReadExtendedConfig(const std::string &path, std::string *out);
 void XmlStartOnce();
 struct SavedGuestInfo {
   uint32_t status = TOOLS_STATUS_UNKNOWN;  // a saved status other than 0 and 9
-  DictPtr manifest;                       // else the saved manifest, if any
+  DictPtr manifest;                        // else the saved manifest, if any
 };
 // ReadSavedGuestInfo reads what the extended config file keeps about the
 // guest; failures are logged and leave both fields empty.

@@ -5,11 +5,11 @@
 #include <cstring>
 
 #include "lib/toolsversion/toolsversion_internal.h"
-#include "tvx_toolsiso.h"
-#include "tvx_toolsiso_image.h"
 #include "platform/ascii.h"
 #include "platform/msglist.h"
 #include "platform/str.h"
+#include "tvx_toolsiso.h"
+#include "tvx_toolsiso_image.h"
 
 namespace tvx::toolsversion {
 
@@ -116,8 +116,8 @@ ComponentInfo *LookupComponent(HashTable *table, const char *name) {
   return HashTable_Lookup(table, name, &data) ? static_cast<ComponentInfo *>(data) : nullptr;
 }
 
-void HandleEntry(HashTable *table, ToolsManifestKind kind, LogSwitches *switches,
-                 const char *name, const char *value) {
+void HandleEntry(HashTable *table, ToolsManifestKind kind, LogSwitches *switches, const char *name,
+                 const char *value) {
   auto reject = [&](const char *message) {
     if (switches != nullptr) TV_LOG("%s: %s = %s\n", message, name, value);
   };
@@ -169,9 +169,9 @@ void HandleEntry(HashTable *table, ToolsManifestKind kind, LogSwitches *switches
     }
   }
   ToolsVersionNumber *field = suffix == Suffix::kVersionMax ? &info->avrMax
-                              : kind == MANIFEST_HOST      ? &info->versionOnHost
-                              : kind == MANIFEST_GUEST     ? &info->versionInGuest
-                                                           : &info->avrMin;
+                              : kind == MANIFEST_HOST       ? &info->versionOnHost
+                              : kind == MANIFEST_GUEST      ? &info->versionInGuest
+                                                            : &info->avrMin;
   if (IsSet(*field)) return reject("Multiple identical entries");
   const char *end = ParseVersion(value, field);
   if (end == nullptr || !OnlyBlanksLeft(end)) reject("Cannot parse version");
@@ -199,7 +199,7 @@ void WalkManifest(const Dictionary *dict, HashTable *table, ToolsManifestKind ki
 
 // LoadAvr loads the AVR manifest once its detached signature holds; null
 // (logged) otherwise.
-DictPtr LoadAvr(const char *avrPath) {
+DictPtr LoadAvr(const char *avrPath, const char *certFile) {
   char *raw = nullptr;
   size_t size = 0;
   if (!ToolsISO_ReadFile(avrPath, &raw, &size)) {
@@ -215,7 +215,7 @@ DictPtr LoadAvr(const char *avrPath) {
     return nullptr;
   }
   CharPtr sig(rawSig);
-  if (!ToolsISO_VerifySignature(nullptr, sig.get(), sigSize, data.get(), size)) {
+  if (!ToolsISO_VerifySignature(certFile, sig.get(), sigSize, data.get(), size)) {
     TV_LOG("Error signature check failed for AVR manifest '%s'.\n", avrPath);
     return nullptr;
   }
@@ -251,7 +251,7 @@ TablePtr FillTable(const Dictionary *host, const Dictionary *avr, const Dictiona
 }
 
 TablePtr LoadManifests(const char *hostPath, const char *avrPath, const Dictionary *guest,
-                       LogSwitches *switches) {
+                       LogSwitches *switches, const char *certFile) {
   UniquePtr<MsgList> messages;
   DictPtr host = LoadDictionary(hostPath, nullptr, 0, &messages);
   if (host == nullptr) {
@@ -261,7 +261,7 @@ TablePtr LoadManifests(const char *hostPath, const char *avrPath, const Dictiona
   }
   DictPtr avr;
   if (avrPath != nullptr) {
-    avr = LoadAvr(avrPath);
+    avr = LoadAvr(avrPath, certFile);
     if (avr == nullptr) TV_LOG("AVR file corrupted, ignoring AVR values\n");
   }
   return FillTable(host.get(), avr.get(), guest, switches);

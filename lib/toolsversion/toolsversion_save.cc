@@ -2,11 +2,11 @@
 // extended config file and rewrites it whole. The document is edited in
 // memory; the file changes only at the very end, through the crash-safe
 // replace, so any failure before or during the write leaves it as it was.
-#include <cerrno>
-#include <cstring>
-
 #include <libxml/parser.h>
 #include <libxml/tree.h>
+
+#include <cerrno>
+#include <cstring>
 
 #include "lib/toolsversion/toolsversion_xml.h"
 #include "platform/ascii.h"
@@ -104,7 +104,8 @@ Bool AddManifestEntry(const char *name, const char *value, void *ctx) {
   std::string component = dot != nullptr ? std::string(name, dot) : std::string(name);
   std::string suffix = dot != nullptr ? std::string(dot + 1) : std::string();
   if (dot != nullptr && ascii::Equal(suffix, "encoding")) return TRUE;
-  if (xmlValidateName(X(component.c_str()), 0) != 0 || !IsXmlText(value)) {
+  if (!IsXmlText(component) || xmlValidateName(X(component.c_str()), 0) != 0 ||
+      !IsXmlText(value)) {
     TV_LOG("Skipping manifest entry '%s': not representable in XML.\n", name);
     return TRUE;
   }
@@ -158,16 +159,19 @@ bool WriteDocument(xmlDoc *doc, const std::string &path) {
   options.mustExist = true;
   bool filled = false;
   int writeErrno = 0, err = 0;
-  Bool ok = File_ReplaceWith(path.c_str(), options, [&](int fd, const char *) {
-    filled = true;
-    if (WriteAll(fd, out.get(), static_cast<size_t>(size))) return true;
-    writeErrno = errno;
-    return false;
-  }, &err);
+  Bool ok = File_ReplaceWith(
+      path.c_str(), options,
+      [&](int fd, const char *) {
+        filled = true;
+        if (WriteAll(fd, out.get(), static_cast<size_t>(size))) return true;
+        writeErrno = errno;
+        return false;
+      },
+      &err);
   if (!ok) {
     if (filled) {
-      TV_LOG("Error writing to extended config file: errcode %d.\n", writeErrno != 0 ? writeErrno
-                                                                                     : err);
+      TV_LOG("Error writing to extended config file: errcode %d.\n",
+             writeErrno != 0 ? writeErrno : err);
     } else {
       TV_LOG("Error opening extended config file for writing: errcode %d.\n", err);
     }
@@ -184,7 +188,8 @@ bool SaveXmlInfo(const char *configPath, const char *updateAgentXml, const char 
   if (IsEmpty(updateAgentXml) && IsEmpty(manifestText) && updateCounter == 0) return true;
 
   UniquePtr<MsgList> messages;
-  DictPtr config = LoadDictionary(configPath, nullptr, 0, &messages);
+  DictPtr config =
+      configPath != nullptr ? LoadDictionary(configPath, nullptr, 0, &messages) : nullptr;
   if (config == nullptr) {
     TV_LOG("Error loading dictionary for tvxx config file.");
     MsgList_Log(messages.get());
@@ -206,8 +211,8 @@ bool SaveXmlInfo(const char *configPath, const char *updateAgentXml, const char 
 
   if (!IsEmpty(updateAgentXml) && std::strcmp(updateAgentXml, "null") != 0) {
     if (std::strcmp(updateAgentXml, "no tools") == 0) {
-      while (xmlNode *tools = agentInfo != nullptr ? FirstChildNamed(agentInfo, "tools")
-                                                   : nullptr) {
+      while (xmlNode *tools =
+                 agentInfo != nullptr ? FirstChildNamed(agentInfo, "tools") : nullptr) {
         RemoveNode(tools);
       }
       RemoveNode(manifest);

@@ -30,11 +30,11 @@ GuestOSID MapGuestOS(const char *guestOS) {
 }
 
 uint32_t MinVersionFor(GuestOSID id) {
-  if (GuestOS_IsWin9x(id) || GuestOS_IsWinNT4(id)) return 7392;          // 7.7.0
-  if (GuestOS_IsWin(id) || GuestOS_IsLinux(id)) return 8384;             // 8.6.0
-  if (GuestOS_IsSolaris(id)) return 9216;                                // 9.0.0
+  if (GuestOS_IsWin9x(id) || GuestOS_IsWinNT4(id)) return 7392;               // 7.7.0
+  if (GuestOS_IsWin(id) || GuestOS_IsLinux(id)) return 8384;                  // 8.6.0
+  if (GuestOS_IsSolaris(id)) return 9216;                                     // 9.0.0
   if (GuestOS_IsDarwin(id) && !GuestOS_IsDarwin15OrHigher(id)) return 10252;  // 10.0.12
-  if (GuestOS_IsNetware(id)) return 8224;                                // 8.1.0
+  if (GuestOS_IsNetware(id)) return 8224;                                     // 8.1.0
   return kDefaultToolsVersion;
 }
 
@@ -69,9 +69,8 @@ uint32_t NewestDiskToolsVersion(const SnapshotStringList *disks) {
 // GuestFromSources loads the guest manifest the caller gave, or the one the
 // extended config file keeps, and evaluates it. `status` becomes the result
 // (or a saved status); the guest dictionary, when there is one, is returned.
-DictPtr GuestFromSources(const char *configPath, Dictionary *config,
-                         const char *guestManifestPath, const char *guestManifestText,
-                         uint32_t *status, Report *report) {
+DictPtr GuestFromSources(const char *configPath, Dictionary *config, const char *guestManifestPath,
+                         const char *guestManifestText, uint32_t *status, Report *report) {
   if (guestManifestPath != nullptr) {
     UniquePtr<MsgList> messages;
     DictPtr guest = LoadDictionary(guestManifestPath, nullptr, 0, &messages);
@@ -118,7 +117,8 @@ uint32_t GetStatus(const char *configPath, Dictionary *config, const char *guest
   if (mode == 2) {
     CharPtr guestOS(Dict_GetString(config, nullptr, "guestOS"));
     if (guestOS == nullptr) {
-      TV_LOG("Failed to find guestOS value from tvxx config file '%s'.\n", configPath);
+      TV_LOG("Failed to find guestOS value from tvxx config file '%s'.\n",
+             configPath != nullptr ? configPath : "");
     } else if (GuestOS_IsOrka(MapGuestOS(guestOS.get()))) {
       return TOOLS_STATUS_NOT_APPLICABLE;
     }
@@ -134,8 +134,8 @@ uint32_t GetStatus(const char *configPath, Dictionary *config, const char *guest
 
   if (toolsVersion == TOOLS_VERSION_FROM_DISKS) {
     SnapshotStringList *rawDevices = nullptr, *rawDisks = nullptr;
-    SnapshotError err = Snapshot_GetCurrentDisksCfgDict(configPath, config, &rawDevices,
-                                                        &rawDisks, 0);
+    SnapshotError err =
+        Snapshot_GetCurrentDisksCfgDict(configPath, config, &rawDevices, &rawDisks, 0);
     StringListPtr devices(rawDevices), disks(rawDisks);
     if (err != SNAPSHOT_OK) {
       if (s != TOOLS_STATUS_UNKNOWN) return s;

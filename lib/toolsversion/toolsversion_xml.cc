@@ -10,11 +10,11 @@
 // or a guest manifest; toolsversion_save.cc merges new reports into it.
 #include "lib/toolsversion/toolsversion_xml.h"
 
-#include <atomic>
-#include <cstring>
-
 #include <libxml/parser.h>
 #include <libxml/xmlversion.h>
+
+#include <atomic>
+#include <cstring>
 
 #include "platform/ascii.h"
 #include "platform/fileio.h"
@@ -33,9 +33,9 @@ void XmlStartOnce() {
 UniquePtr<xmlDoc> ParseXml(const char *text, size_t length) {
   XmlStartOnce();
   if (length > static_cast<size_t>(INT32_MAX)) return nullptr;
-  return UniquePtr<xmlDoc>(xmlReadMemory(text, static_cast<int>(length), nullptr, nullptr,
-                                         XML_PARSE_NONET | XML_PARSE_NOERROR |
-                                             XML_PARSE_NOWARNING));
+  return UniquePtr<xmlDoc>(
+      xmlReadMemory(text, static_cast<int>(length), nullptr, nullptr,
+                    XML_PARSE_NONET | XML_PARSE_NOERROR | XML_PARSE_NOWARNING));
 }
 
 bool NameIs(const xmlNode *node, const char *name) {

@@ -3,20 +3,14 @@
 # AVR manifest beside it, and guest manifests that come out current, too
 # old, too new and blacklisted, each with its reason; then the guest's
 # reports saved into the extended config file and read back from it.
-# The status trusts what the build trusts: a build whose certificate
-# directory lies in its own tree gets the test PKI there; a product build
-# trusts the system directory, which this demo never writes.
+# The demo's own PKI is named with --cert, so the step runs the same whatever
+# directory the build trusts.
 echo "== tools status: guest manifests against a signed tools image"
 st="$work/status"
+pki="$work/pki"
 mkdir -p "$st/tools/isoimages" "$st/tree"
-certdir=$(sed -n 's/^TVX_CERT_DIR:[A-Z]*=//p' "$build/CMakeCache.txt")
-case "$certdir" in
-  "$build"/*) "$root/scripts/make-test-pki" "$certdir" ;;
-  *) echo "  (this build trusts $certdir; without the maker's certificate there the"
-     echo "   image is refused and only the legacy tools number decides)" ;;
-esac
-signer="$certdir/signers/maker"
-[ -f "$signer.key" ] || { "$root/scripts/make-test-pki" "$work/pki" && signer="$work/pki/signers/maker"; }
+"$root/scripts/make-test-pki" "$pki"
+signer="$pki/signers/maker"
 printf 'monolithic.version = 12.2.0\nvmci.version = 12.2.0\n' >"$st/tree/manifest.txt"
 xorriso -as mkisofs -quiet -R -J -o "$st/tools/isoimages/linux.iso" "$st/tree" 2>/dev/null
 cat "$signer.pem" "$signer.chain" >"$st/signer.pem"
@@ -24,18 +18,18 @@ cat "$signer.pem" "$signer.chain" >"$st/signer.pem"
   "$st/tools/isoimages/linux.iso" "$st/tools/isoimages/linux.iso.sha" >/dev/null
 avr="$st/tools/isoimages/linux_avr_manifest.txt"
 printf 'monolithic.version = 12.0.0\nmonolithic.version_max = 12.9\nmonolithic.version_illegal = 12.1.1\n' >"$avr"
-"$root/scripts/make-test-pki" sign "$(dirname "$(dirname "$signer")")" maker "$avr" "$avr.sig"
+"$root/scripts/make-test-pki" sign "$pki" maker "$avr" "$avr.sig"
 printf 'guestOS = "ubuntu-64"\nlibdir = "%s"\nextendedConfigFile = "vm.xml"\n' "$st/tools" >"$st/vm.tvx"
 echo '<vm/>' >"$st/vm.xml"
 echo "  host: monolithic and vmci 12.2.0; AVR: minimum 12.0.0, maximum 12.9, illegal 12.1.1"
 for v in 12.2.0 11.5.0 13.0.0 12.1.1; do
   printf 'monolithic.version = %s\nvmci.version = %s\nvmci.installed = yes\n' "$v" "$v" >"$st/guest.txt"
   echo "  guest tools $v:"
-  "$tool" tools status --tools-version 12384 --guest-manifest "$st/guest.txt" "$st/vm.tvx" |
+  "$tool" tools status --cert "$pki/tarvex.cert" --tools-version 12384 --guest-manifest "$st/guest.txt" "$st/vm.tvx" |
     sed 's/^/    /'
 done
 echo "  the ratings behind the last one (-v):"
-"$tool" -v tools status --tools-version 12384 --guest-manifest "$st/guest.txt" "$st/vm.tvx" \
+"$tool" -v tools status --cert "$pki/tarvex.cert" --tools-version 12384 --guest-manifest "$st/guest.txt" "$st/vm.tvx" \
   2>/dev/null | sed -n '/component/,$p' | sed 's/^/  /'
 
 echo "  the guest's update agent and manifest saved, then read back:"
@@ -44,4 +38,4 @@ printf 'monolithic.version = 11.5.0\nvmci.version = 12.2.0\nvmci.installed = TRU
 "$tool" tools save-info "$st/vm.tvx" --agent-xml "$st/agent.xml" --manifest "$st/manifest.txt" \
   --install-error 0 --counter 1 | sed 's/^/    /'
 xmllint --format "$st/vm.xml" | sed 's/^/    /'
-"$tool" tools status --tools-version 12384 "$st/vm.tvx" | sed 's/^/    /'
+"$tool" tools status --cert "$pki/tarvex.cert" --tools-version 12384 "$st/vm.tvx" | sed 's/^/    /'

@@ -155,15 +155,10 @@ static void TestWindowsAnswers(void) {
 /* The SHA-256 crypt and a Linux answer file. */
 static void TestLinuxAnswers(void) {
   char dir[] = "/tmp/tvx_c_api_linux_XXXXXX";
-  char out[600], hash[128], small[8], b64[4];
-  char *cp = b64;
-  int left = 4;
+  char out[600], hash[128];
   phase = "linux answers";
   CHECK(SHA256_crypt("Hello world!", "$5$saltstring", hash, (int)sizeof hash) == hash);
   CHECK(strcmp(hash, "$5$saltstring$5B8vYYiY.CVt1RlTTf8KbXBH3hsxY/GNooZaBBGWEc5") == 0);
-  CHECK(SHA256_crypt("Hello world!", "$5$saltstring", small, (int)sizeof small) == NULL);
-  b64_from_24bit(0, 0, 1, 4, &left, &cp);
-  CHECK(left == 0 && memcmp(b64, "/...", 4) == 0);
   if (mkdtemp(dir) == NULL) {
     CHECK(!"temporary directory made");
     return;
@@ -207,7 +202,7 @@ static void TestToolsVersion(void) {
   CHECK(!Dictionary_LoadEx(config, "/nonexistent/tvx-vm.tvx", NULL));
   CHECK(ToolsVersion_GetStatus("/nonexistent/vm.tvx", config, NULL, "", 10252, 5) ==
         TOOLS_STATUS_NOT_APPLICABLE);
-  CHECK(ToolsVersion_GetStatusReport("/nonexistent/vm.tvx", config, NULL, "", 0, 0, &report) ==
+  CHECK(ToolsVersion_GetStatusReport("/nonexistent/vm.tvx", config, NULL, "", 0, 0, NULL, &report) ==
         TOOLS_STATUS_NOT_INSTALLED);
   CHECK(report != NULL && report->status == TOOLS_STATUS_NOT_INSTALLED && !report->evaluated);
   ToolsVersion_FreeReport(report);
@@ -254,21 +249,12 @@ static void TestSignature(void) {
 
 static void TestToolsImage(void) {
   ToolsIsoLocalFile *local = NULL;
-  ToolsIsoHashInfo *info = NULL;
-  ToolsIsoImageInfo imageInfo;
-  char *path = NULL;
+  ToolsIsoImageInfo info;
   phase = "tools_image";
-  CHECK(ToolsISO_ValidateName("linux.iso"));
-  CHECK(!ToolsISO_ValidateName("../linux.iso"));
-  CHECK(ToolsISO_GetImageBaseName(20510) != NULL);
-  CHECK(ToolsISO_GetRefreshCount() >= 1);
-  CHECK(!ToolsISO_GetImagePath("/nonexistent/tvx-tools", "rhel6", NULL, TRUE, &path, NULL, NULL));
-  CHECK(path == NULL);
+  CHECK(ToolsISO_ValidateName("linux.iso") && !ToolsISO_ValidateName("../linux.iso"));
+  CHECK(ToolsISO_GetImageBaseName(20510) != NULL && ToolsISO_GetRefreshCount() >= 1);
   CHECK(ToolsISO_LocalFileOpen("/nonexistent/tvx-tools.iso", FALSE, &local) == TOOLSISO_OPEN_IO_ERROR);
-  CHECK(local == NULL);
-  CHECK(ToolsISO_GetLocalFileHashInfo("/nonexistent/tvx-tools.iso", 1, FALSE, &info));
-  CHECK(info == NULL);
-  CHECK(!ToolsISO_GetImageInfo(NULL, &imageInfo));
+  CHECK(local == NULL && !ToolsISO_GetImageInfo(NULL, &info));
 }
 
 /* Linux install media: what needs a floppy, and calls that need no files. */

@@ -64,6 +64,27 @@ for out in suse-iso suse-tree; do
     "$tmp/$out/isolinux/isolinux.cfg"
 done
 
+# Ubuntu 16.04 keeps its entries in txt.cfg, included from an isolinux.cfg
+# that has none: the other .cfg files of that directory are tried in order.
+u16=$tmp/ubuntu1604
+mkdir -p "$u16/isolinux" "$u16/casper"
+printf 'include menu.cfg\ndefault vesamenu.c32\nprompt 0\n' >"$u16/isolinux/isolinux.cfg"
+printf 'menu title Ubuntu\n' >"$u16/isolinux/menu.cfg"
+printf 'default live\nlabel live\n  kernel /casper/vmlinuz.efi\n  append  file=/cdrom/preseed/ubuntu.seed boot=casper initrd=/casper/initrd.lz quiet splash ---\n' \
+  >"$u16/isolinux/txt.cfg"
+printf 'K-1604' >"$u16/casper/vmlinuz.efi"
+printf 'I-1604' >"$u16/casper/initrd.lz"
+cp "$bin" "$ldlinux" "$u16/isolinux/"
+master "$u16" "$tmp/ubuntu1604.iso"
+for src in "$u16" "$tmp/ubuntu1604.iso"; do
+  rm -rf "$tmp/u16"
+  "$tool" unattended scan --guest-os ubuntu-64 --out "$tmp/u16" "$src" >/dev/null 2>&1
+  check "Ubuntu 16.04 $(basename "$src"): entry from txt.cfg" \
+    grep -qx $'\tappend initrd=initrd.lz file=/cdrom/preseed/ubuntu.seed boot=casper quiet splash ---  debian-installer/custom-installation=/custom find_preseed=/preseed.cfg auto preseed/file=/floppy/preseed.cfg automatic-ubiquity noprompt priority=critical locale=en_US console-setup/modelcode=evdev' \
+    "$tmp/u16/isolinux/isolinux.cfg"
+  check "Ubuntu 16.04 $(basename "$src"): casper kernel" cmp -s "$u16/casper/vmlinuz.efi" "$tmp/u16/isolinux/vmlinuz.efi"
+done
+
 # Ubuntu 20.10 has no isolinux: the casper defaults and the caller's loader,
 # whose ldlinux.c32 comes from the host's syslinux.
 ubu=$tmp/ubuntu
@@ -100,7 +121,12 @@ if "$tool" unattended linux --help >/dev/null 2>&1; then
     sh -c 'isoinfo -d -i "$1" | grep -q "El Torito"' - "$media/autoinst.iso"
   check "ks.cfg at the root of autoinst.iso" \
     sh -c 'isoinfo -i "$1" -x "/KS.CFG;1" | grep -qF "rootpw --iscrypted \$5\$"' - "$media/autoinst.iso"
-  check "the staging tree is gone" test -z "$(find "$media" -mindepth 1 -maxdepth 1 -name '.autoinst-tree*')"
+  check "the media directory holds autoinst.iso alone" test "$(ls -A "$media")" = autoinst.iso
+  "$tool" unattended linux "${answers[@]}" --out "$tmp/ans2" --media "$tmp/failed" \
+    --mkisofs /bin/false "$tmp/centos.iso" >/dev/null 2>&1
+  check "a failing mastering tool: exit 1" test $? -eq 1
+  check "... and nothing left in the media directory" test -z "$(ls -A "$tmp/failed" 2>/dev/null)"
+  check "... nor any staging directory" test -z "$(find "$tmp" -maxdepth 1 -name '.*staging*')"
   ubuiso=$tmp/ubu2004.iso
   mkdir -p "$tmp/u2004/.disk"
   printf 'Ubuntu 20.04.1 LTS "Focal Fossa" - Release amd64 (20200731)' >"$tmp/u2004/.disk/info"

@@ -142,7 +142,9 @@ TEST_F(ScanDisk, EmptyIsolinuxCfgFallsBackToAnotherCfg) {
   Put(src_.Join("isolinux/a.CFG"), "label x\n kernel /boot/k\n append initrd=/boot/i x\n");
   Put(src_.Join("boot/k"), "K");
   Put(src_.Join("boot/i"), "I");
+  LogCapture log;
   ASSERT_TRUE(Scan("ubuntu-64"));
+  EXPECT_EQ(log.All(), "");
   EXPECT_EQ(ReadFileOrDie(Out("k")), "K");
   EXPECT_NE(ReadFileOrDie(Out("isolinux.cfg")).find("append initrd=i x  debian-installer/"),
             std::string::npos);

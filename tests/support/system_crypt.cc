@@ -9,7 +9,8 @@ namespace tvxtest {
 std::string SystemCrypt(const std::string &key, const std::string &setting) {
   using CryptRn = char *(*)(const char *, const char *, void *, int);
   static void *lib = dlopen("libcrypt.so.1", RTLD_NOW | RTLD_LOCAL);
-  static auto crypt_rn = lib != nullptr ? reinterpret_cast<CryptRn>(dlsym(lib, "crypt_rn")) : nullptr;
+  static auto crypt_rn =
+      lib != nullptr ? reinterpret_cast<CryptRn>(dlsym(lib, "crypt_rn")) : nullptr;
   if (crypt_rn == nullptr) return "";
   // Larger than libxcrypt's struct crypt_data, so no development header is
   // needed.

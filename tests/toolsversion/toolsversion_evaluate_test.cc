@@ -21,7 +21,7 @@ DictPtr Dict(const std::string &text) {
 TEST(ToolsVersionNumber, ParsesAndFormats) {
   struct Case {
     const char *text;
-    bool version;   // ParseVersion says it is one
+    bool version;  // ParseVersion says it is one
     const char *rest;
     const char *formatted;
   } cases[] = {
@@ -30,8 +30,8 @@ TEST(ToolsVersionNumber, ParsesAndFormats) {
       {"11.2.5.1234#4", true, "", "11.2.5.1234#4"},
       {"11#1", true, "", "11.0.0.0#1"},
       {"1.2.3.4.5.6", true, "", "1.2.3.4"},  // a fifth number is read and dropped
-      {"1.2#9", true, "", "1.2.0.0#4"},     // precision limited to 4
-      {"1.2.3.4#0", true, "", ""},          // not set
+      {"1.2#9", true, "", "1.2.0.0#4"},      // precision limited to 4
+      {"1.2.3.4#0", true, "", ""},           // not set
       {"1.2.3x", true, "x", "1.2.3.0"},
       {"1.2.3 ", true, " ", "1.2.3.0"},
       {"1.2.", false, "", ""},
@@ -77,10 +77,9 @@ TEST(ToolsVersionManifest, RejectedEntriesAreLoggedForHostAndAvrOnly) {
     tvxtest::LogCapture log;
     HandleEntry(table.get(), c.kind, c.kind == MANIFEST_GUEST ? nullptr : &switches, c.name,
                 c.value);
-    std::string expected = c.message == nullptr
-                               ? ""
-                               : std::string("ToolsVersion: ") + c.message + ": " + c.name +
-                                     " = " + c.value + "\n";
+    std::string expected = c.message == nullptr ? ""
+                                                : std::string("ToolsVersion: ") + c.message + ": " +
+                                                      c.name + " = " + c.value + "\n";
     EXPECT_EQ(log.All(), expected) << c.name;
   }
 }
@@ -138,33 +137,28 @@ const StatusCase kStatusCases[] = {
      "monolithic.version = 11.0.0\n", TOOLS_STATUS_TOO_OLD, "M=too old",
      "Status is too old because this is status of monolithic version."},
     {"monolithic supported old above the AVR minimum", "monolithic.version = 11.1.0\n",
-     "monolithic.version = 10.0.0\n", "monolithic.version = 11.0.0\n",
-     TOOLS_STATUS_SUPPORTED_OLD, "M=supported old",
-     "Status is supported old because this is status of monolithic version."},
+     "monolithic.version = 10.0.0\n", "monolithic.version = 11.0.0\n", TOOLS_STATUS_SUPPORTED_OLD,
+     "M=supported old", "Status is supported old because this is status of monolithic version."},
     {"monolithic supported new below the maximum", "monolithic.version = 11.1.0\n",
-     "monolithic.version = 10.0.0\nmonolithic.version_max = 12\n",
-     "monolithic.version = 11.5.0\n", TOOLS_STATUS_SUPPORTED_NEW, "M=supported new",
+     "monolithic.version = 10.0.0\nmonolithic.version_max = 12\n", "monolithic.version = 11.5.0\n",
+     TOOLS_STATUS_SUPPORTED_NEW, "M=supported new",
      "Status is supported new because this is status of monolithic version."},
     {"monolithic too new above the maximum", "monolithic.version = 11.1.0\n",
-     "monolithic.version_max = 11.1#2\n", "monolithic.version = 11.2.0\n",
-     TOOLS_STATUS_TOO_NEW, "M=too new",
-     "Status is too new because this is status of monolithic version."},
+     "monolithic.version_max = 11.1#2\n", "monolithic.version = 11.2.0\n", TOOLS_STATUS_TOO_NEW,
+     "M=too new", "Status is too new because this is status of monolithic version."},
     {"monolithic current", "monolithic.version = 11.1.0.7#3\n", nullptr,
      "monolithic.version = 11.1.0.9\n", TOOLS_STATUS_CURRENT, "M=current",
      "Status is current because this is status of monolithic version."},
     {"illegal with precision 0 matches every version", "monolithic.version = 1.0\n",
-     "monolithic.version_illegal = 3#0\n", "monolithic.version = 5.5\n",
-     TOOLS_STATUS_BLACKLISTED, "M=blacklisted",
-     "Status is blacklisted because this is status of monolithic version."},
+     "monolithic.version_illegal = 3#0\n", "monolithic.version = 5.5\n", TOOLS_STATUS_BLACKLISTED,
+     "M=blacklisted", "Status is blacklisted because this is status of monolithic version."},
     {"no monolithic anywhere", "alpha.version = 1\n", nullptr, "", TOOLS_STATUS_CURRENT,
      "M=gone; alpha=missing from the guest", ""},
-    {"legacy and upgrader stand in for monolithic",
-     "legacy.version = 11.0\nupgrader.version = 1\n", nullptr,
-     "upgrader.version = 1\nupgrader.installed = yes\n", TOOLS_STATUS_TOO_OLD,
+    {"legacy and upgrader stand in for monolithic", "legacy.version = 11.0\nupgrader.version = 1\n",
+     nullptr, "upgrader.version = 1\nupgrader.installed = yes\n", TOOLS_STATUS_TOO_OLD,
      "M=too old; upgrader=current",
      "Status is too old because this is status of monolithic version."},
-    {"blacklisted beats too old",
-     "alpha.version = 2\nbeta.version = 2\n",
+    {"blacklisted beats too old", "alpha.version = 2\nbeta.version = 2\n",
      "alpha.version_illegal = 1.5 , 1.0\nbeta.version = 2\n",
      "alpha.version = 1.0\nalpha.installed = 1\nbeta.version = 1.9\nbeta.installed = 1\n",
      TOOLS_STATUS_BLACKLISTED, "M=gone; alpha=blacklisted; beta=too old",
@@ -175,15 +169,13 @@ const StatusCase kStatusCases[] = {
      "beta.version = 1\nbeta.installed = 1\n",
      TOOLS_STATUS_TOO_OLD, "M=too old; alpha=too old; beta=too old",
      "Status is too old because this is status of monolithic version and 2 more components."},
-    {"too new with one other",
-     "a.version = 1\nb.version = 1\n", "a.version_max = 1\nb.version_max = 1\n",
-     "a.version = 2\na.installed = 1\nb.version = 3\nb.installed = 1\n",
-     TOOLS_STATUS_TOO_NEW, "M=gone; a=too new; b=too new",
-     "Status is too new because this is status of a and b."},
+    {"too new with one other", "a.version = 1\nb.version = 1\n",
+     "a.version_max = 1\nb.version_max = 1\n",
+     "a.version = 2\na.installed = 1\nb.version = 3\nb.installed = 1\n", TOOLS_STATUS_TOO_NEW,
+     "M=gone; a=too new; b=too new", "Status is too new because this is status of a and b."},
     {"missing components under a supported-new monolithic",
      "monolithic.version = 2\na.version = 1\nb.version = 1\nc.version = 1\nd.version = 1\n",
-     "monolithic.version = 1\n",
-     "monolithic.version = 3\nd.version = 1\nd.installed = 1\n",
+     "monolithic.version = 1\n", "monolithic.version = 3\nd.version = 1\nd.installed = 1\n",
      TOOLS_STATUS_SUPPORTED_NEW,
      "M=supported new; a=missing from the guest; b=missing from the guest; "
      "c=missing from the guest; d=current",
@@ -202,11 +194,10 @@ const StatusCase kStatusCases[] = {
      "a.version = 2\nb.version = 2\nc.version = 2\n", "c.version = 1\n",
      "a.version = 3\na.installed = 1\nb.version = 1\nb.installed = 1\nc.version = 1\n"
      "c.installed = 1\n",
-     TOOLS_STATUS_SUPPORTED_OLD,
-     "M=gone; a=supported new; b=supported old; c=supported old",
+     TOOLS_STATUS_SUPPORTED_OLD, "M=gone; a=supported new; b=supported old; c=supported old",
      "Status is supported old because this is status of b and c."},
-    {"supported new, additional, not installed, gone",
-     "a.version = 2\nb.version = 2\n", "b.version = 1\n",
+    {"supported new, additional, not installed, gone", "a.version = 2\nb.version = 2\n",
+     "b.version = 1\n",
      "a.version = 1\nb.version = 3\nb.installed = 1\nextra.version = 1\nextra.installed = 1\n",
      TOOLS_STATUS_SUPPORTED_NEW,
      "M=gone; a=not installed; b=supported new; extra=additional in the guest",

@@ -48,10 +48,11 @@ class ToolsVersionImage : public ::testing::Test {
     std::string signer = certDir_ + "signers/maker";
     WriteFileOrDie(pristine_->Join("signer.pem"),
                    ReadFileOrDie(signer + ".pem") + ReadFileOrDie(signer + ".chain"));
-    ASSERT_EQ(Shell("'" + tvxtest::ToolPath() + "' hashdata create --quiet --block-size 2048 --key '" +
-                  signer + ".key' --cert '" + pristine_->Join("signer.pem") + "' '" + iso +
-                  "' '" + iso + ".sha'"),
-              0);
+    ASSERT_EQ(
+        Shell("'" + tvxtest::ToolPath() + "' hashdata create --quiet --block-size 2048 --key '" +
+              signer + ".key' --cert '" + pristine_->Join("signer.pem") + "' '" + iso + "' '" +
+              iso + ".sha'"),
+        0);
     WriteFileOrDie(pristine_->Join("linux_avr_manifest.txt"), kAvr);
     WriteFileOrDie(pristine_->Join("linux_avr_manifest.txt.sig"),
                    tvxtest::Sign(certDir_, "maker", kAvr, false));
@@ -89,9 +90,9 @@ class ToolsVersionImage : public ::testing::Test {
       WriteFileOrDie(images + "/linux.iso", bytes);
     }
     if (setup == Fault::kStrangerHash) {
-      WriteFileOrDie(images + "/linux.iso.sig",
-                     tvxtest::Sign(certDir_, "stranger", ReadFileOrDie(images + "/linux.iso.sha"),
-                                   false));
+      WriteFileOrDie(
+          images + "/linux.iso.sig",
+          tvxtest::Sign(certDir_, "stranger", ReadFileOrDie(images + "/linux.iso.sha"), false));
     }
     WriteFileOrDie(dir_.Join("vm.tvx"), "guestOS = ubuntu-64\nlibdir = \"" + dir_.Join("tools") +
                                             "\"\nextendedConfigFile = vm.xml\n");
@@ -115,8 +116,8 @@ TEST_F(ToolsVersionImage, GuestAgainstSignedImageAndAvr) {
     const char *name;
     Fault setup;
     const char *guest;
-    uint32_t status;         // of the evaluation
-    const char *logged;      // a line the case must log
+    uint32_t status;     // of the evaluation
+    const char *logged;  // a line the case must log
   } cases[] = {
       // vmci is missing, which decides only beside a supported old or new
       // monolithic version.
@@ -133,13 +134,14 @@ TEST_F(ToolsVersionImage, GuestAgainstSignedImageAndAvr) {
        "ToolsVersion: Status is supported old because this is status of monolithic version, and "
        "vmci is missing from the guest.\n"},
       {"no AVR: the host version is the minimum", Fault::kNoAvr, "monolithic.version = 12.1\n",
-       TOOLS_STATUS_TOO_OLD, "ToolsVersion: GetHostManifests: Done extracting the manifest file.\n"},
+       TOOLS_STATUS_TOO_OLD,
+       "ToolsVersion: GetHostManifests: Done extracting the manifest file.\n"},
       {"AVR signed by a stranger is ignored", Fault::kStrangerAvr, "monolithic.version = 12.1\n",
        TOOLS_STATUS_TOO_OLD, "ToolsVersion: AVR file corrupted, ignoring AVR values\n"},
       {"no tools image", Fault::kNoImage, "monolithic.version = 12.2\n", TOOLS_STATUS_UNKNOWN,
        "ToolsVersion: Error getting host tools manifest files.\n"},
-      {"tampered image", Fault::kTamperedImage, "monolithic.version = 12.2\n",
-       TOOLS_STATUS_UNKNOWN, "ToolsVersion: Error getting host tools manifest files.\n"},
+      {"tampered image", Fault::kTamperedImage, "monolithic.version = 12.2\n", TOOLS_STATUS_UNKNOWN,
+       "ToolsVersion: Error getting host tools manifest files.\n"},
       {"hash data signed by a stranger", Fault::kStrangerHash, "monolithic.version = 12.2\n",
        TOOLS_STATUS_UNKNOWN, "ToolsVersion: Failed to verify signature for Tools ISO image.\n"},
   };
@@ -148,8 +150,8 @@ TEST_F(ToolsVersionImage, GuestAgainstSignedImageAndAvr) {
     Tools(c.setup);
     tvxtest::LogCapture log;
     ToolsVersionReport *report = nullptr;
-    ToolsVersion_GetStatusReport(dir_.Join("vm.tvx").c_str(), config_, nullptr, c.guest, 12000,
-                                 0, &report);
+    ToolsVersion_GetStatusReport(dir_.Join("vm.tvx").c_str(), config_, nullptr, c.guest, 12000, 0,
+                                 nullptr, &report);
     ASSERT_NE(report, nullptr);
     // A failed fetch is retried with the legacy number, which fails alike.
     EXPECT_EQ(report->manifestStatus, c.status);
@@ -176,9 +178,9 @@ TEST_F(ToolsVersionImage, GuestManifestFileAndSavedManifest) {
   ASSERT_TRUE(ToolsVersion_SaveXmlInfo(
       dir_.Join("vm.tvx").c_str(),
       "<a><tools><monolithic guestVersion=\"12.1.1\" status=\"9\"/></tools></a>", nullptr, 0, 0));
-  EXPECT_EQ(ToolsVersion_GetStatus(dir_.Join("vm.tvx").c_str(), config_, nullptr, nullptr, 12384,
-                                   0),
-            TOOLS_STATUS_BLACKLISTED);
+  EXPECT_EQ(
+      ToolsVersion_GetStatus(dir_.Join("vm.tvx").c_str(), config_, nullptr, nullptr, 12384, 0),
+      TOOLS_STATUS_BLACKLISTED);
 }
 
 }  // namespace

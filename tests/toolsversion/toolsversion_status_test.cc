@@ -7,8 +7,8 @@
 #include <sys/resource.h>
 
 #include <csignal>
-#include <filesystem>
 #include <cstdlib>
+#include <filesystem>
 #include <string>
 
 #include "platform/xml_unique.h"
@@ -40,9 +40,9 @@ class ToolsVersionStatus : public ::testing::Test {
   // Config writes the VM configuration (the tools directory is empty, so no
   // host manifest can be had) and loads it.
   Dictionary *Config(const std::string &extra) {
-    WriteFileOrDie(dir_.Join("vm.tvx"), "libdir = \"" + dir_.Path() +
-                                            "/no-tools\"\nextendedConfigFile = \"vm.xml\"\n" +
-                                            extra);
+    WriteFileOrDie(
+        dir_.Join("vm.tvx"),
+        "libdir = \"" + dir_.Path() + "/no-tools\"\nextendedConfigFile = \"vm.xml\"\n" + extra);
     Dictionary_Free(config_);
     config_ = Dictionary_Create();
     EXPECT_TRUE(Dictionary_LoadEx(config_, ConfigPath().c_str(), nullptr));
@@ -101,13 +101,13 @@ TEST_F(ToolsVersionStatus, LegacyNumberAgainstTheGuestsLimits) {
 TEST_F(ToolsVersionStatus, DiskQueryFailureAndHardwareVersion) {
   Dictionary *config = Config("guestOS = winXPPro\n");
   // Without a configuration path the disks cannot be listed.
-  EXPECT_EQ(ToolsVersion_GetStatus(nullptr, config, nullptr, "monolithic.version = 1\n",
-                                   0xFFFFFFFF, 0),
-            TOOLS_STATUS_TOO_OLD);
-  EXPECT_EQ(ToolsVersion_GetStatus(nullptr, config, nullptr,
-                                   "monolithic.version = 1\nvirtualHW.version = 21\n",
-                                   0xFFFFFFFF, 0),
-            TOOLS_STATUS_UNKNOWN);
+  EXPECT_EQ(
+      ToolsVersion_GetStatus(nullptr, config, nullptr, "monolithic.version = 1\n", 0xFFFFFFFF, 0),
+      TOOLS_STATUS_TOO_OLD);
+  EXPECT_EQ(
+      ToolsVersion_GetStatus(nullptr, config, nullptr,
+                             "monolithic.version = 1\nvirtualHW.version = 21\n", 0xFFFFFFFF, 0),
+      TOOLS_STATUS_UNKNOWN);
 }
 
 TEST_F(ToolsVersionStatus, SavedStatusIsPassedOnUnlessZeroOrUnknown) {
@@ -115,8 +115,10 @@ TEST_F(ToolsVersionStatus, SavedStatusIsPassedOnUnlessZeroOrUnknown) {
   struct Case {
     const char *status;
     uint32_t expected;
-  } cases[] = {{"4", TOOLS_STATUS_SUPPORTED_NEW}, {"6", TOOLS_STATUS_BLACKLISTED},
-               {"9", TOOLS_STATUS_CURRENT},       {"0", TOOLS_STATUS_CURRENT},
+  } cases[] = {{"4", TOOLS_STATUS_SUPPORTED_NEW},
+               {"6", TOOLS_STATUS_BLACKLISTED},
+               {"9", TOOLS_STATUS_CURRENT},
+               {"0", TOOLS_STATUS_CURRENT},
                {"junk", TOOLS_STATUS_CURRENT}};
   for (const Case &c : cases) {
     WriteFileOrDie(dir_.Join("vm.xml"),
@@ -150,8 +152,8 @@ TEST_F(ToolsVersionStatus, SavedStatusIsPassedOnUnlessZeroOrUnknown) {
 // XPath returns the count of the nodes `expr` selects and their texts
 // joined by "|": "2:a|b".
 std::string XPath(const std::string &xml, const char *expr) {
-  tvx::UniquePtr<xmlDoc> doc(xmlReadMemory(xml.data(), static_cast<int>(xml.size()), nullptr,
-                                           nullptr, XML_PARSE_NONET));
+  tvx::UniquePtr<xmlDoc> doc(
+      xmlReadMemory(xml.data(), static_cast<int>(xml.size()), nullptr, nullptr, XML_PARSE_NONET));
   if (doc == nullptr) return "<unparsable>";
   tvx::UniquePtr<xmlXPathContext> ctx(xmlXPathNewContext(doc.get()));
   tvx::UniquePtr<xmlXPathObject> obj(
@@ -214,6 +216,16 @@ TEST_F(ToolsVersionStatus, SaveMergesAndReadsBack) {
   EXPECT_EQ(XPath(xml, "/vm/update-agent-info/drivers"), "1:");
   EXPECT_EQ(XPath(xml, "/vm/tools-manifest"), "0:");
   EXPECT_EQ(XPath(xml, "/vm/keep"), "1:x");
+
+  // Entries that XML cannot carry are skipped: written, they would make the
+  // whole file unreadable.
+  tvxtest::LogCapture log;
+  ASSERT_TRUE(ToolsVersion_SaveXmlInfo(
+      cfg.c_str(), nullptr, "a\xf0\x9a = 1\nb.version = \"\\x01\"\nc.version = 2\n", 0, 0));
+  EXPECT_EQ(XPath(Xml(), "/vm/tools-manifest/*/@version"), "1:2");
+  EXPECT_TRUE(
+      log.Contains("ToolsVersion: Skipping manifest entry 'b.version': not representable "
+                   "in XML.\n"));
 }
 
 TEST_F(ToolsVersionStatus, FailedSaveLeavesTheFileAsItWas) {
