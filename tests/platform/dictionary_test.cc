@@ -208,34 +208,6 @@ TEST(Dictionary, FileLoadFailuresSayWhy) {
   Dictionary_Free(d);
 }
 
-// Random texts over the format's special characters: the reader must never
-// crash, and whatever it accepts must survive a write and a re-read.
-TEST(Dictionary, RandomTextsNeverCrashAndAcceptedOnesRoundTrip) {
-  static const char kAlphabet[] = "ab =\"#\\\n\r\tx0\x01\xc3";
-  uint32_t state = 12345;
-  auto next = [&state] {
-    state = state * 1103515245u + 12345u;
-    return state >> 16;
-  };
-  int accepted = 0;
-  for (int round = 0; round < 3000; round++) {
-    std::string text;
-    size_t len = next() % 40;
-    for (size_t i = 0; i < len; i++) text += kAlphabet[next() % (sizeof kAlphabet - 1)];
-    Entries got;
-    if (!Parse(text, &got).empty()) continue;
-    accepted++;
-    Dictionary *loaded = Dictionary_Create();
-    ASSERT_TRUE(Dictionary_LoadFromBufferEx(loaded, text.data(), text.size(), nullptr));
-    std::string written = Take(Dictionary_WriteToBuffer(loaded, nullptr));
-    Entries again;
-    EXPECT_EQ(Parse(written, &again), "") << written;
-    EXPECT_EQ(again, got) << text;
-    Dictionary_Free(loaded);
-  }
-  EXPECT_GT(accepted, 100);
-}
-
 TEST(Dictionary, StringToBool) {
   struct Case {
     const char *text;

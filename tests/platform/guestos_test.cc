@@ -29,51 +29,6 @@ TEST(GuestOS, NamesCompareWithoutCase) {
   EXPECT_EQ(GuestOS_GetNameByOSID(GUESTOS_ID_UNKNOWN), nullptr);
 }
 
-// The tools-image family table's ranges; an id must never land in another
-// family's range (Arm and newer guests may be in none).
-enum Range { kNoRange, kWinPre2k, kWindows, kNoTools, kLinux, kSolaris, kFreeBSD, kNetware, kDarwin };
-
-Range RangeOf(GuestOSID id) {
-  struct {
-    GuestOSID lo, hi;
-    Range range;
-  } const rows[] = {
-      {20483, 20486, kWinPre2k}, {20486, 20513, kWindows}, {20595, 20602, kNoTools},
-      {20517, 20535, kLinux},    {20539, 20550, kLinux},   {20603, 20632, kLinux},
-      {20566, 20571, kSolaris},  {20551, 20565, kFreeBSD}, {20592, 20594, kNetware},
-      {20572, 20589, kDarwin},
-  };
-  for (const auto &r : rows) {
-    if (id >= r.lo && id <= r.hi) return r.range;
-  }
-  return kNoRange;
-}
-
-TEST(GuestOS, EveryIdFallsIntoItsFamilyRange) {
-  for (size_t i = 0; i < GuestOS_TableSize(); i++) {
-    GuestOSID id = GuestOS_TableId(i);
-    std::string name = GuestOS_GetNameByOSID(id);
-    bool arm = name.rfind("arm-", 0) == 0;
-    Range r = RangeOf(id);
-    if (arm) {
-      EXPECT_EQ(r, kNoRange) << name << ": an x86 tools image would be offered";
-      continue;
-    }
-    switch (r) {
-      case kWinPre2k: EXPECT_TRUE(GuestOS_IsWin9x(id) || GuestOS_IsWinNT4(id)) << name; break;
-      case kWindows: EXPECT_TRUE(GuestOS_IsWin2kOrHigher(id)) << name; break;
-      case kNoTools: EXPECT_TRUE(GuestOS_IsOrka(id) || name == "winHyperV") << name; break;
-      case kLinux: EXPECT_TRUE(GuestOS_IsLinux(id)) << name; break;
-      case kSolaris: EXPECT_TRUE(GuestOS_IsSolaris(id)) << name; break;
-      case kFreeBSD: EXPECT_TRUE(GuestOS_IsFreeBSD(id)) << name; break;
-      case kNetware: EXPECT_TRUE(GuestOS_IsNetware(id)) << name; break;
-      case kDarwin: EXPECT_TRUE(GuestOS_IsDarwin(id)) << name; break;
-      case kNoRange:  // newer guests: the signed image map names their image
-        break;
-    }
-  }
-}
-
 enum Pred {
   k64 = 1 << 0, kWin = 1 << 1, k9x = 1 << 2, kNT4 = 1 << 3, k2k = 1 << 4, k2kUp = 1 << 5,
   kVista = 1 << 6, kVistaUp = 1 << 7, k8C = 1 << 8, k8S = 1 << 9, k10C = 1 << 10,

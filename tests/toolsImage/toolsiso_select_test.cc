@@ -11,6 +11,7 @@
 #include <vector>
 
 #include "lib/toolsImage/toolsiso_image_internal.h"
+#include "platform/guestos.h"
 #include "support/log_capture.h"
 #include "support/test_pki.h"
 #include "tvx_toolsiso_image.h"
@@ -172,6 +173,13 @@ TEST(ToolsImageName, NamesAndFamilies) {
   EXPECT_STREQ(ToolsISO_GetImageBaseName(20632), "linux.iso");
   EXPECT_EQ(ToolsISO_GetImageBaseName(20595), nullptr);
   EXPECT_EQ(ToolsISO_GetImageBaseName(20514), nullptr);
+  // An Arm guest is never offered an x86 family image.
+  for (size_t i = 0; i < GuestOS_TableSize(); i++) {
+    std::string name = GuestOS_GetNameByOSID(GuestOS_TableId(i));
+    if (name.rfind("arm-", 0) == 0) {
+      EXPECT_EQ(ToolsISO_GetImageBaseName(GuestOS_TableId(i)), nullptr) << name;
+    }
+  }
 }
 
 // The tools directory is fixed by the first call that succeeds; trailing
