@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "support/log_capture.h"
+#include "support/run_argv.h"
 
 namespace {
 
@@ -27,23 +28,9 @@ std::string DbGet(const std::string &path, const char *key, DiskLibError *rc) {
   return out;
 }
 
-// A sparse disk as qemu-img makes it, with the tools version patched into
-// its embedded descriptor (qemu writes a placeholder of the same length).
-std::string MakeSparseDisk(const TempDir &t, const char *name, const char *toolsVersion10) {
-  std::string path = t.Join(name);
-  std::string cmd = "qemu-img create -q -f vmdk '" + path + "' 1M";
-  if (std::system(cmd.c_str()) != 0) return "";
-  std::string bytes = ReadFileOrDie(path);
-  size_t at = bytes.find("ddb.toolsVersion = \"2147483647\"");
-  if (at == std::string::npos) return "";
-  bytes.replace(at + 20, 10, toolsVersion10);
-  WriteFileOrDie(path, bytes);
-  return path;
-}
-
 TEST(DiskLib, ReadsTheDiskDatabaseOfSparseAndDescriptorDisks) {
   TempDir t;
-  std::string sparse = MakeSparseDisk(t, "sparse.vmdk", "0000010304");
+  std::string sparse = tvxtest::MakeSparseVmdk(t.Join("sparse.vmdk"), 10304);
   ASSERT_FALSE(sparse.empty()) << "qemu-img is needed";
   DiskLibError rc;
   EXPECT_EQ(DbGet(sparse, "toolsVersion", &rc), "0000010304");
@@ -65,7 +52,7 @@ TEST(DiskLib, ReadsTheDiskDatabaseOfSparseAndDescriptorDisks) {
 
 TEST(DiskLib, RefusesDamagedOrForeignFiles) {
   TempDir t;
-  std::string sparse = MakeSparseDisk(t, "base.vmdk", "0000000001");
+  std::string sparse = tvxtest::MakeSparseVmdk(t.Join("base.vmdk"), 1);
   ASSERT_FALSE(sparse.empty());
   std::string good = ReadFileOrDie(sparse);
   auto patched = [&](size_t offset, unsigned char byte) {

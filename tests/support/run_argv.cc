@@ -5,6 +5,10 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <cstdio>
+
+#include "support/log_capture.h"
+
 extern char **environ;
 
 namespace tvxtest {
@@ -34,6 +38,18 @@ int RunArgv(const std::vector<std::string> &argv, std::string *out, const RunOpt
   int status = 0;
   if (rc != 0 || waitpid(pid, &status, 0) != pid || !WIFEXITED(status)) return -1;
   return WEXITSTATUS(status);
+}
+
+std::string MakeSparseVmdk(const std::string &path, unsigned toolsVersion) {
+  if (RunArgv({"qemu-img", "create", "-q", "-f", "vmdk", path, "1M"}) != 0) return "";
+  std::string bytes = ReadFileOrDie(path);
+  size_t at = bytes.find("ddb.toolsVersion = \"2147483647\"");
+  if (at == std::string::npos) return "";
+  char digits[11];
+  std::snprintf(digits, sizeof digits, "%010u", toolsVersion);
+  bytes.replace(at + 20, 10, digits);
+  WriteFileOrDie(path, bytes);
+  return path;
 }
 
 }  // namespace tvxtest

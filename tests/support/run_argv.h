@@ -18,4 +18,9 @@ struct RunOptions {
 int RunArgv(const std::vector<std::string> &argv, std::string *out = nullptr,
             const RunOptions &options = {});
 
+// MakeSparseVmdk makes a 1 MiB sparse disk at `path` with qemu-img and puts
+// `toolsVersion` into its disk database (qemu writes a placeholder of the
+// same length). Returns `path`, or "" when that fails.
+std::string MakeSparseVmdk(const std::string &path, unsigned toolsVersion);
+
 }  // namespace tvxtest
