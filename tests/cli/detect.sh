@@ -4,11 +4,7 @@
 # cannot be opened.
 set -uo pipefail
 tool=${TVX_TOOL:?} media=${TVX_MEDIA_DIR:?}
-fail=0
-check() {  # check WHAT COND...
-  local what=$1; shift
-  if "$@"; then echo "ok: $what"; else echo "FAIL: $what"; fail=1; fi
-}
+. "$(dirname "$0")/lib/check.sh"
 tmp=$(mktemp -d)
 trap 'rm -rf "$tmp"' EXIT
 
@@ -23,7 +19,7 @@ check "one error line for each unopenable image" \
 images=$(find "$media" -type f \( -name '*.iso' -o -name '*.img' -o -name '*.udf' \) | wc -l)
 check "one record per image ($images + 2)" test "$(wc -l <"$tmp/all.jsonl")" -eq $((images + 2))
 
-/usr/bin/python3 - "$tmp/all.jsonl" "$media/" "$tmp/" <<'PY' || fail=1
+/usr/bin/python3 - "$tmp/all.jsonl" "$media/" "$tmp/" <<'PY' || fails=$((fails + 1))
 import json, sys
 types = {"path": str, "result": int, "guestOS": (str, type(None)),
          "guestOSOverride": (str, type(None)), "version": int, "versionName": str,
@@ -88,4 +84,4 @@ for bad in "" "--bogus x.iso" "-r"; do
 done
 check "--help" bash -c '"$0" detect --help >/dev/null' "$tool"
 
-exit $fail
+exit $((fails > 0))

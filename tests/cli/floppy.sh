@@ -3,11 +3,7 @@
 # is checked with fsck.fat and read back with mtools; exit statuses.
 set -uo pipefail
 tool=${TVX_TOOL:?} media=${TVX_MEDIA_DIR:?} src=${TVX_SOURCE_DIR:?}
-fail=0
-check() {  # check WHAT COND...
-  local what=$1; shift
-  if "$@"; then echo "ok: $what"; else echo "FAIL: $what"; fail=1; fi
-}
+. "$(dirname "$0")/lib/check.sh"
 if ! "$tool" floppy --help >/dev/null 2>&1; then
   echo "skip: this tool has no 'floppy' command"
   exit 0
@@ -70,4 +66,4 @@ if [ -e "$winxp" ]; then
 else
   echo "skip: $winxp not mastered"
 fi
-exit $fail
+exit $((fails > 0))

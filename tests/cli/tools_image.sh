@@ -10,25 +10,13 @@ certs=${TVX_CERT_DIR:-}
 work=$(mktemp -d)
 web_pid=
 trap '[ -n "$web_pid" ] && kill "$web_pid" 2>/dev/null; rm -rf "$work"' EXIT
-fails=0
-
-check() {  # check DESCRIPTION EXPECTED_STATUS ACTUAL_STATUS [OUTPUT PATTERN]
-  local what=$1 want=$2 got=$3
-  if [ "$want" != "$got" ]; then
-    echo "FAIL: $what: exit $got, expected $want"; echo "${4:-}"; fails=$((fails + 1)); return
-  fi
-  if [ $# -ge 5 ] && ! grep -qF -- "$5" <<<"$4"; then
-    echo "FAIL: $what: output lacks '$5':"; echo "$4"; fails=$((fails + 1)); return
-  fi
-  echo "ok: $what"
-}
-
+. "$(dirname "$0")/lib/check.sh"
 
 out=$(LD_DEBUG=libs "$tool" --version 2>&1 >/dev/null); st=$?
 grep -q 'libcurl' <<<"$out" && st=99
-check "--version does not load libcurl" 0 $st
+check_exit "--version does not load libcurl" 0 $st
 out=$(LD_DEBUG=libs "$tool" tools verify --quiet http://127.0.0.1:1/linux.iso 2>&1)
-check "a URL loads libcurl on first use" 2 $? "$out" "libcurl.so.4"
+check_exit "a URL loads libcurl on first use" 2 $? "$out" "libcurl.so.4"
 
 if [ -z "$certs" ]; then
   echo "skip: the build trusts a certificate directory outside its tree"
@@ -59,14 +47,14 @@ printf 'windows9-64 = "windows.iso"\nrhel6 = "linux.iso"\n' >"$map"
 "$src/scripts/make-test-pki" sign "$certs" maker "$map" "$map.sig"
 
 out=$("$tool" tools image --json "$work/tools" windows9-64)
-check "map chooses the Windows image" 0 $? "$out" '"source": "map"'
+check_exit "map chooses the Windows image" 0 $? "$out" '"source": "map"'
 
 out=$("$tool" tools verify "$iso/windows.iso")
-check "verify a detached signature" 0 $? "$out" "signature:  detached, valid"
+check_exit "verify a detached signature" 0 $? "$out" "signature:  detached, valid"
 out=$("$tool" tools verify --cert "$certs/tvxpartner.cert" "$iso/windows.iso" 2>&1)
-check "another certificate named with --cert is the only trust" 3 $? "$out" "Signature verification failed"
+check_exit "another certificate named with --cert is the only trust" 3 $? "$out" "Signature verification failed"
 out=$("$tool" tools cat "$iso/linux.iso" bin/payload | cmp - "$work/tree/lin/bin/payload" 2>&1)
-check "cat a file byte-exact" 0 $? "$out"
+check_exit "cat a file byte-exact" 0 $? "$out"
 
 port=$(/usr/bin/python3 -c 'import socket; s=socket.socket(); s.bind(("127.0.0.1",0)); print(s.getsockname()[1])')
 printf 'server.document-root = "%s"\nserver.bind = "127.0.0.1"\nserver.port = %s\nmimetype.assign = ("" => "application/octet-stream")\n' \
@@ -75,17 +63,17 @@ lighttpd -D -f "$work/lighttpd.conf" 2>/dev/null &
 web_pid=$!
 for _ in $(seq 50); do (exec 3<>"/dev/tcp/127.0.0.1/$port") 2>/dev/null && break; sleep 0.1; done
 out=$("$tool" tools verify --json "http://127.0.0.1:$port/linux.iso?v=1")
-check "verify over HTTP with an embedded signature" 0 $? "$out" '"verified": true'
+check_exit "verify over HTTP with an embedded signature" 0 $? "$out" '"verified": true'
 out=$("$tool" tools cat "http://127.0.0.1:$port/windows.iso" manifest.txt)
-check "cat over HTTP" 0 $? "$out" 'family = "windows"'
+check_exit "cat over HTTP" 0 $? "$out" 'family = "windows"'
 
 # Flip one byte inside the payload: verify names its block, cat fails.
 offset=$(/usr/bin/python3 -c 'import sys; d=open(sys.argv[1],"rb").read(); print(d.find(open(sys.argv[2],"rb").read(4096)) + 70000)' \
   "$iso/linux.iso" "$work/tree/lin/bin/payload")
 printf 'X' | dd of="$iso/linux.iso" bs=1 seek="$offset" conv=notrunc status=none
 out=$("$tool" tools verify --json "$iso/linux.iso")
-check "flipped byte found" 1 $? "$out" "\"firstBadBlock\": $((offset / 4096))"
+check_exit "flipped byte found" 1 $? "$out" "\"firstBadBlock\": $((offset / 4096))"
 out=$("$tool" tools cat "$iso/linux.iso" bin/payload 2>&1 >/dev/null)
-check "cat through a bad block fails" 1 $? "$out" "Invalid data at offset"
+check_exit "cat through a bad block fails" 1 $? "$out" "Invalid data at offset"
 
 exit $((fails > 0))
