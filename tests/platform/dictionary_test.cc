@@ -14,11 +14,7 @@ namespace {
 
 using Entries = std::vector<std::pair<std::string, std::string>>;
 
-std::string Take(char *s) {
-  std::string out = s != nullptr ? s : "<null>";
-  std::free(s);
-  return out;
-}
+using tvxtest::Take;
 
 Entries All(const Dictionary *d) {
   Entries out;

@@ -16,11 +16,7 @@ using tvxtest::ReadFileOrDie;
 using tvxtest::TempDir;
 using tvxtest::WriteFileOrDie;
 
-std::string Take(char *s) {
-  std::string out = s != nullptr ? s : "<null>";
-  std::free(s);
-  return out;
-}
+using tvxtest::Take;
 
 TEST(File, GetPathNameSplitsAtLastSlash) {
   struct Case {

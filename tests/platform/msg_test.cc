@@ -9,11 +9,7 @@
 
 namespace {
 
-std::string Take(char *s) {
-  std::string out = s != nullptr ? s : "<null>";
-  std::free(s);
-  return out;
-}
+using tvxtest::Take;
 
 TEST(Msg, DefaultTextsWithoutCatalogue) {
   Msg_SetLocale("");

@@ -69,6 +69,12 @@ void WriteFileOrDie(const std::string &path, const std::string &content) {
   out << content;
 }
 
+std::string Take(char *s) {
+  std::string out = s != nullptr ? s : "<null>";
+  std::free(s);
+  return out;
+}
+
 std::string Bytes(size_t n, int seed) {
   std::string s(n, '\0');
   for (size_t i = 0; i < n; i++) s[i] = static_cast<char>((i * 31 + static_cast<size_t>(seed)) % 251);

@@ -47,6 +47,9 @@ class TempDir {
 // Whole-file helpers for fixtures.
 std::string ReadFileOrDie(const std::string &path);
 void WriteFileOrDie(const std::string &path, const std::string &content);
+// Take returns a malloc'd text the callee handed over ("<null>" for none)
+// and frees it.
+std::string Take(char *s);
 // Bytes gives `n` bytes of a pattern that differs with `seed`.
 std::string Bytes(size_t n, int seed = 0);
 
