@@ -4,9 +4,8 @@ namespace {
 
 using tvxtest::ExpectGuess;
 using tvxtest::GuessRow;
-
-constexpr bool kNoIso = true;
-constexpr bool kIso = false;
+using tvxtest::kIso;
+using tvxtest::kNoIso;
 
 TEST(GuessSUSE, ContentFile) {
   const GuessRow rows[] = {

@@ -18,6 +18,8 @@ namespace tvxtest {
 
 // One mastered image and what Guess_Guest must make of it. A null guestOS
 // means "not recognised" (result 1); versionText may still be expected then.
+constexpr bool kNoIso = true;  // GuessRow::noIsolinux
+constexpr bool kIso = false;
 struct GuessRow {
   const char *image;  // below $TVX_MEDIA_DIR, without ".iso"
   const char *guestOS;
