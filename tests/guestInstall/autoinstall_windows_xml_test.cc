@@ -141,14 +141,6 @@ TEST_F(XmlOps, FirstLogonCommandDeclaresTheWcmPrefixWhenTheTemplateLacksIt) {
   EXPECT_EQ(back.Count(TVXTEST_FIRST_LOGON "[@wcm:action='add']"), 1u);
 }
 
-TEST_F(XmlOps, FirstLogonCommandNeedsOneInTheTemplate) {
-  Load("<unattend xmlns=\"urn:schemas-microsoft-com:unattend\"><settings pass=\"oobeSystem\">"
-       "<component name=\"Microsoft-Windows-Shell-Setup\"><FirstLogonCommands/></component>"
-       "</settings></unattend>");
-  EXPECT_FALSE(AutoInstallXmlAddFirstLogonCommand(doc_.get(), "cmd"));
-  EXPECT_FALSE(AutoInstallXmlAddFirstLogonCommand(doc_.get(), "bad \x01"));
-}
-
 TEST(AutoInstallEditUnattendXml, RefusesUnparsableFilesAndUncarriableTexts) {
   tvxtest::TempDir dir;
   tvxtest::LogCapture log;
