@@ -19,6 +19,7 @@
 #include "tvx_log.h"
 #include "command_group.h"
 #include "floppy_cli.h"
+#include "log_lines.h"
 #include "staged_output.h"
 #include "unattended_common.h"
 
@@ -159,12 +160,6 @@ int Parse(const std::vector<std::string> &args, Options *o) {
   return -1;
 }
 
-void Capture(TvxLogLevel, const char *text, void *ctx) {
-  std::string line = text;
-  if (!line.empty() && line.back() == '\n') line.pop_back();
-  static_cast<std::vector<std::string> *>(ctx)->push_back(line);
-}
-
 // Editions of a Vista-or-newer medium come as "name?name?...".
 std::vector<std::string> SplitEditions(const char *list) {
   std::vector<std::string> out;
@@ -262,8 +257,8 @@ int Run(const std::vector<std::string> &args) {
 
   // The library's reasons are collected so that a failure can show them
   // without -v.
-  std::vector<std::string> log;
-  if (!Verbose()) Tvx_SetLogSink(Capture, &log);
+  LogLines capture;
+  std::vector<std::string> &log = capture.lines;
   Bool ok = AutoInstall_PrepareAnswerFileEx(
       o.sif.c_str(), o.xml.c_str(), o.haveStorePwd ? o.storePwd.c_str() : nullptr,
       o.haveKey ? o.productKey.c_str() : nullptr, o.fullName.c_str(),
@@ -272,7 +267,6 @@ int Run(const std::vector<std::string> &args) {
       o.haveLanguage ? o.language.c_str() : nullptr, o.imageName.c_str(), o.autoLogon,
       o.keepPartitions);
   if (ok && o.floppy.wanted) ok = o.floppy.Make(stage.dir());
-  if (!Verbose()) Tvx_SetLogSink(nullptr, nullptr);
   if (ok && !stage.Commit(&stageError)) {
     log.push_back("cannot move the answer files into " + o.out + ": " + stageError);
     ok = FALSE;
