@@ -1,7 +1,6 @@
 // tvxguest unattended windows: recognise a Windows install image and write
 // its answer files. It joins the `unattended` command group, and is left out
 // of a tool built without that group.
-#if __has_include("command_group.h") && __has_include("unattended_common.h")
 #include <algorithm>
 #include <cstdio>
 #include <cstring>
@@ -275,32 +274,9 @@ int Run(const std::vector<std::string> &args) {
   std::sort(files.begin(), files.end(), [](const std::string &a, const std::string &b) {
     return FileOrder(a) < FileOrder(b);
   });
-  const char *versionName =
-      guess.version < GUESS_VERSION_DUMMY_LAST
-          ? Guess_GetSubString(static_cast<GuessVersion>(guess.version))
-          : "";
-  if (o.json) {
-    std::printf("%s\n", JsonObject()
-                            .Bool("result", ok)
-                            .Str("guestOS", guess.guestOS)
-                            .Num("version", guess.version)
-                            .Str("versionName", versionName != nullptr ? versionName : "")
-                            .Bool("supported", supported)
-                            .Bool("imageListed", offered)
-                            .StrArray("files", files)
-                            .StrArray("log", log)
-                            .Text()
-                            .c_str());
-    return ok ? 0 : 1;
-  }
-  std::printf("%s: %s\n", o.image.c_str(), GuestLabel(guess).c_str());
-  if (!ok) {
-    std::fprintf(stderr, "tvxguest %s: the answer files were not written\n", kName);
-    for (const std::string &line : log) std::fprintf(stderr, "  %s\n", line.c_str());
-    return 1;
-  }
-  for (const std::string &f : files) std::printf("wrote %s\n", f.c_str());
-  return 0;
+  return ReportAnswers({kName, &o.image, &guess, static_cast<bool>(ok), static_cast<bool>(supported),
+                        &offered, &files, &log, "the answer files were not written"},
+                       o.json);
 }
 
 const SubcommandRegistration kRegistration(
@@ -308,5 +284,3 @@ const SubcommandRegistration kRegistration(
 
 }  // namespace
 }  // namespace tvxcli
-
-#endif
