@@ -87,6 +87,7 @@ class MemSource final : public BlockSource {
   bool ReadAt(uint64_t offset, void *buf, size_t len) override {
     if (offset > size_ || len > size_ - offset) return false;
     if (len != 0) std::memcpy(buf, data_ + offset, len);
+    g_sourceBytesRead.fetch_add(len, std::memory_order_relaxed);
     return true;
   }
   uint64_t Size() const override { return size_; }

@@ -76,11 +76,7 @@ class Walker {
   std::unordered_set<uint64_t> visited_;
 };
 
-struct Item {
-  std::string path;  // relative to the destination
-  TreeNode node;
-  std::vector<DataRun> runs;
-};
+using Item = PlannedEntry;
 
 // Planner gathers what an extraction will write and checks the rules first.
 class Planner {
@@ -115,6 +111,7 @@ class Planner {
     return TreeStatus::kOk;
   }
   const std::vector<Item> &Items() const { return items_; }
+  std::vector<Item> Take() { return std::move(items_); }
 
  private:
   TreeSource &src_;
@@ -227,7 +224,7 @@ int ResultCode(TreeStatus st) {
   return 4;
 }
 
-TreeStatus ExtractTree(TreeSource &src, std::string_view path, const char *destDir) {
+TreeStatus PlanExtraction(TreeSource &src, std::string_view path, std::vector<PlannedEntry> *out) {
   TreeNode top;
   TreeStatus st = src.Resolve(path, &top);
   if (st != TreeStatus::kOk) return st;
@@ -241,13 +238,20 @@ TreeStatus ExtractTree(TreeSource &src, std::string_view path, const char *destD
   } else {
     st = TreeStatus::kNotFound;
   }
+  if (st == TreeStatus::kOk) *out = plan.Take();
+  return st;
+}
+
+TreeStatus ExtractTree(TreeSource &src, std::string_view path, const char *destDir) {
+  std::vector<PlannedEntry> items;
+  TreeStatus st = PlanExtraction(src, path, &items);
   if (st != TreeStatus::kOk) return st;
 
   st = MakeHostDirs(destDir);
   if (st != TreeStatus::kOk) return st;
   UniqueFd dest(::open(destDir, O_RDONLY | O_DIRECTORY | O_CLOEXEC));
   if (!dest) return FromErrno(errno);
-  for (const Item &item : plan.Items()) {
+  for (const Item &item : items) {
     st = WriteItem(src, dest.get(), item);
     if (st != TreeStatus::kOk) {
       Log("%s: cannot extract \"%s\" into \"%s\"\n", src.LogPrefix(), item.path.c_str(), destDir);

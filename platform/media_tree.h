@@ -82,6 +82,18 @@ using TreeVisitor = std::function<TreeStatus(const std::string &relPath, const T
 TreeStatus WalkTree(TreeSource &src, const TreeNode &top, bool recursive,
                     const TreeVisitor &visit);
 
+// PlannedEntry is one entry an extraction will write, with a file's runs.
+struct PlannedEntry {
+  std::string path;  // relative to the destination
+  TreeNode node;
+  std::vector<DataRun> runs;
+};
+
+// PlanExtraction makes ExtractTree's decisions without writing: the entries
+// below `path` (or the file at `path`) in the order they are written, or the
+// reason the tree is refused.
+TreeStatus PlanExtraction(TreeSource &src, std::string_view path, std::vector<PlannedEntry> *out);
+
 // ExtractTree writes the file at `path` into `destDir` under its own name, or
 // the contents of the directory at `path` (created with its parents). Nothing
 // is written when the tree breaks a rule (see above). Symbolic links and other

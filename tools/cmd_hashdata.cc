@@ -10,6 +10,7 @@
 #include "command_group.h"
 #include "hashdata_writer.h"
 #include "json.h"
+#include "log_lines.h"
 #include "progress.h"
 #include "tvx_log.h"
 #include "tvx_toolsiso.h"
@@ -125,14 +126,6 @@ int Create(const std::vector<std::string> &args) {
   return 0;
 }
 
-// Lines collects the library's log lines for the report (and still shows
-// them with -v).
-std::vector<std::string> g_lines;
-void CollectSink(TvxLogLevel, const char *text, void *) {
-  g_lines.emplace_back(text);
-  if (Verbose()) std::fprintf(stderr, "tvxguest: lib: %s", text);
-}
-
 struct BlockReport {
   uint64_t blocks = 0;
   uint64_t bad = 0;
@@ -211,7 +204,8 @@ int Check(const std::vector<std::string> &args) {
   if (files.size() != 2) return UsageError(kCheck, "HASHDATA and IMAGE are needed");
   if (sigPath.empty()) sigPath = CompanionSig(files[0]);
 
-  Tvx_SetLogSink(CollectSink, nullptr);
+  LogLines log;
+  const std::vector<std::string> &lines = log.lines;
   std::string bytes, error;
   ToolsIsoHashInfo *info = nullptr;
   if (ReadWhole(files[0], kMaxHashData, &bytes, &error)) {
@@ -221,7 +215,7 @@ int Check(const std::vector<std::string> &args) {
     if (info == nullptr) std::free(copy);
   }
   if (info == nullptr) {
-    std::string reason = !error.empty() ? error : g_lines.empty() ? "refused" : g_lines[0];
+    std::string reason = !error.empty() ? error : lines.empty() ? "refused" : lines[0];
     if (!reason.empty() && reason.back() == '\n') reason.pop_back();
     if (json) {
       std::printf("%s\n", JsonObject().Bool("hashData", false).Str("error", reason).Text().c_str());
@@ -239,16 +233,15 @@ int Check(const std::vector<std::string> &args) {
   } else {
     sigRead = ReadWhole(sigPath, kMaxHashData, &sig, &error);
   }
-  size_t logged = g_lines.size();
+  size_t logged = lines.size();
   bool sigOk =
       sigRead && ToolsISO_VerifySignature(cert.empty() ? nullptr : cert.c_str(), sig.data(),
                                           sig.size(), info->data, info->dataSize - sigSize);
-  std::string sigError = !sigRead ? error : g_lines.size() > logged ? g_lines[logged] : "";
+  std::string sigError = !sigRead ? error : lines.size() > logged ? lines[logged] : "";
   if (!sigError.empty() && sigError.back() == '\n') sigError.pop_back();
   BlockReport r = CheckBlocks(info, files[1], quiet);
   uint32_t blockSize = static_cast<uint32_t>(Le(h + 44, 4));
   ToolsISO_FreeHashInfo(info);
-  Tvx_SetLogSink(nullptr, nullptr);
 
   bool good = sigOk && r.bad == 0 && r.problem.empty();
   if (json) {

@@ -14,31 +14,6 @@
 
 namespace tvxcli {
 
-void LogLines::Sink(TvxLogLevel, const char *text, void *ctx) {
-  std::string line(text);
-  while (!line.empty() && line.back() == '\n') line.pop_back();
-  static_cast<LogLines *>(ctx)->lines.push_back(line);
-}
-
-LogLines::LogLines() {
-  if (!Verbose()) Tvx_SetLogSink(Sink, this);
-}
-
-LogLines::~LogLines() {
-  if (!Verbose()) Tvx_SetLogSink(nullptr, nullptr);
-}
-
-void LogLines::Print(FILE *out) const {
-  for (const std::string &l : lines) std::fprintf(out, "  %s\n", l.c_str());
-}
-
-bool LogLines::Contains(const char *text) const {
-  for (const std::string &l : lines) {
-    if (l.find(text) != std::string::npos) return true;
-  }
-  return false;
-}
-
 namespace {
 
 constexpr const char *kCmd = "tools image";

@@ -2,7 +2,6 @@
 // answer file. The file is made in a staging directory beside --out and
 // moved into place only when the whole call succeeded, so a failing call
 // leaves nothing in --out.
-#if __has_include("command_group.h") && __has_include("unattended_common.h")
 #include <cstdio>
 #include <cstring>
 #include <filesystem>
@@ -225,31 +224,9 @@ int Run(const std::vector<std::string> &args) {
   if (ok) files = FilesBelow(stage.committed());
   ok = ok && ContinueWithMedia(o.image, guess, o.out, o.media, o.json, &files, &log);
 
-  const char *versionName =
-      guess.version < GUESS_VERSION_DUMMY_LAST
-          ? Guess_GetSubString(static_cast<GuessVersion>(guess.version))
-          : "";
-  if (o.json) {
-    std::printf("%s\n", JsonObject()
-                            .Bool("result", ok)
-                            .Str("guestOS", guess.guestOS)
-                            .Num("version", guess.version)
-                            .Str("versionName", versionName != nullptr ? versionName : "")
-                            .Bool("supported", supported)
-                            .StrArray("files", files)
-                            .StrArray("log", log)
-                            .Text()
-                            .c_str());
-    return ok ? 0 : 1;
-  }
-  std::printf("%s: %s\n", o.image.c_str(), GuestLabel(guess).c_str());
-  if (!ok) {
-    std::fprintf(stderr, "tvxguest %s: the answer file was not written\n", kName);
-    for (const std::string &line : log) std::fprintf(stderr, "  %s\n", line.c_str());
-    return 1;
-  }
-  for (const std::string &f : files) std::printf("wrote %s\n", f.c_str());
-  return 0;
+  return ReportAnswers({kName, &o.image, &guess, static_cast<bool>(ok), static_cast<bool>(supported),
+                        nullptr, &files, &log, "the answer file was not written"},
+                       o.json);
 }
 
 const SubcommandRegistration kRegistration(
@@ -257,5 +234,3 @@ const SubcommandRegistration kRegistration(
 
 }  // namespace
 }  // namespace tvxcli
-
-#endif

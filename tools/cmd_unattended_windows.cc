@@ -1,7 +1,6 @@
 // tvxguest unattended windows: recognise a Windows install image and write
 // its answer files. It joins the `unattended` command group, and is left out
 // of a tool built without that group.
-#if __has_include("command_group.h") && __has_include("unattended_common.h")
 #include <algorithm>
 #include <cstdio>
 #include <cstring>
@@ -19,6 +18,7 @@
 #include "tvx_log.h"
 #include "command_group.h"
 #include "floppy_cli.h"
+#include "log_lines.h"
 #include "staged_output.h"
 #include "unattended_common.h"
 
@@ -159,12 +159,6 @@ int Parse(const std::vector<std::string> &args, Options *o) {
   return -1;
 }
 
-void Capture(TvxLogLevel, const char *text, void *ctx) {
-  std::string line = text;
-  if (!line.empty() && line.back() == '\n') line.pop_back();
-  static_cast<std::vector<std::string> *>(ctx)->push_back(line);
-}
-
 // Editions of a Vista-or-newer medium come as "name?name?...".
 std::vector<std::string> SplitEditions(const char *list) {
   std::vector<std::string> out;
@@ -262,8 +256,8 @@ int Run(const std::vector<std::string> &args) {
 
   // The library's reasons are collected so that a failure can show them
   // without -v.
-  std::vector<std::string> log;
-  if (!Verbose()) Tvx_SetLogSink(Capture, &log);
+  LogLines capture;
+  std::vector<std::string> &log = capture.lines;
   Bool ok = AutoInstall_PrepareAnswerFileEx(
       o.sif.c_str(), o.xml.c_str(), o.haveStorePwd ? o.storePwd.c_str() : nullptr,
       o.haveKey ? o.productKey.c_str() : nullptr, o.fullName.c_str(),
@@ -272,7 +266,6 @@ int Run(const std::vector<std::string> &args) {
       o.haveLanguage ? o.language.c_str() : nullptr, o.imageName.c_str(), o.autoLogon,
       o.keepPartitions);
   if (ok && o.floppy.wanted) ok = o.floppy.Make(stage.dir());
-  if (!Verbose()) Tvx_SetLogSink(nullptr, nullptr);
   if (ok && !stage.Commit(&stageError)) {
     log.push_back("cannot move the answer files into " + o.out + ": " + stageError);
     ok = FALSE;
@@ -281,32 +274,9 @@ int Run(const std::vector<std::string> &args) {
   std::sort(files.begin(), files.end(), [](const std::string &a, const std::string &b) {
     return FileOrder(a) < FileOrder(b);
   });
-  const char *versionName =
-      guess.version < GUESS_VERSION_DUMMY_LAST
-          ? Guess_GetSubString(static_cast<GuessVersion>(guess.version))
-          : "";
-  if (o.json) {
-    std::printf("%s\n", JsonObject()
-                            .Bool("result", ok)
-                            .Str("guestOS", guess.guestOS)
-                            .Num("version", guess.version)
-                            .Str("versionName", versionName != nullptr ? versionName : "")
-                            .Bool("supported", supported)
-                            .Bool("imageListed", offered)
-                            .StrArray("files", files)
-                            .StrArray("log", log)
-                            .Text()
-                            .c_str());
-    return ok ? 0 : 1;
-  }
-  std::printf("%s: %s\n", o.image.c_str(), GuestLabel(guess).c_str());
-  if (!ok) {
-    std::fprintf(stderr, "tvxguest %s: the answer files were not written\n", kName);
-    for (const std::string &line : log) std::fprintf(stderr, "  %s\n", line.c_str());
-    return 1;
-  }
-  for (const std::string &f : files) std::printf("wrote %s\n", f.c_str());
-  return 0;
+  return ReportAnswers({kName, &o.image, &guess, static_cast<bool>(ok), static_cast<bool>(supported),
+                        &offered, &files, &log, "the answer files were not written"},
+                       o.json);
 }
 
 const SubcommandRegistration kRegistration(
@@ -314,5 +284,3 @@ const SubcommandRegistration kRegistration(
 
 }  // namespace
 }  // namespace tvxcli
-
-#endif

@@ -5,6 +5,8 @@
 #include <string>
 #include <vector>
 
+#include "tvx_log.h"
+
 namespace tvxcli {
 
 struct Command {
@@ -28,5 +30,9 @@ bool IsHelp(const std::string &arg);
 
 // True when verbose logging (-v) is on.
 bool Verbose();
+
+// VerboseLogSink prints a library log line to standard error (the sink -v
+// installs).
+void VerboseLogSink(TvxLogLevel level, const char *text, void *ctx);
 
 }  // namespace tvxcli

@@ -18,13 +18,17 @@ std::vector<Command> &Registry() {
 
 bool g_verbose = false;
 
-void StderrSink(TvxLogLevel level, const char *text, void *) {
+}  // namespace
+
+void VerboseLogSink(TvxLogLevel level, const char *text, void *) {
   std::fputs("tvxguest: lib: ", stderr);
   std::fputs(text, stderr);
   size_t n = std::strlen(text);
   if (n == 0 || text[n - 1] != '\n') std::fputc('\n', stderr);
   (void)level;
 }
+
+namespace {
 
 void PrintHelp(FILE *out) {
   std::fprintf(out,
@@ -87,7 +91,7 @@ int main(int argc, char **argv) {
     PrintHelp(stderr);
     return 64;
   }
-  if (g_verbose) Tvx_SetLogSink(StderrSink, nullptr);
+  if (g_verbose) Tvx_SetLogSink(VerboseLogSink, nullptr);
   for (const Command &c : Commands()) {
     if (std::strcmp(c.name, argv[i]) == 0) {
       std::vector<std::string> args(argv + i + 1, argv + argc);

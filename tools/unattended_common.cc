@@ -4,6 +4,7 @@
 #include <cstdlib>
 #include <cstring>
 
+#include "json.h"
 #include "tvx_autoinstall.h"
 
 namespace tvxcli {
@@ -111,6 +112,33 @@ std::string CheckAnswer(const GuessResult &guess, const char *label, const std::
   std::free(message);
   if (error == AUTOINSTALL_TEXT_OK) return "";
   return who + " is refused: " + why;
+}
+
+int ReportAnswers(const AnswerReport &r, bool json) {
+  const GuessResult &guess = *r.guess;
+  const char *versionName =
+      guess.version < GUESS_VERSION_DUMMY_LAST
+          ? Guess_GetSubString(static_cast<GuessVersion>(guess.version))
+          : "";
+  if (json) {
+    JsonObject o;
+    o.Bool("result", r.ok)
+        .Str("guestOS", guess.guestOS)
+        .Num("version", guess.version)
+        .Str("versionName", versionName != nullptr ? versionName : "")
+        .Bool("supported", r.supported);
+    if (r.imageListed != nullptr) o.Bool("imageListed", *r.imageListed);
+    std::printf("%s\n", o.StrArray("files", *r.files).StrArray("log", *r.log).Text().c_str());
+    return r.ok ? 0 : 1;
+  }
+  std::printf("%s: %s\n", r.image->c_str(), GuestLabel(guess).c_str());
+  if (!r.ok) {
+    std::fprintf(stderr, "tvxguest %s: %s\n", r.cmd, r.failure);
+    for (const std::string &line : *r.log) std::fprintf(stderr, "  %s\n", line.c_str());
+    return 1;
+  }
+  for (const std::string &f : *r.files) std::printf("wrote %s\n", f.c_str());
+  return 0;
 }
 
 }  // namespace tvxcli

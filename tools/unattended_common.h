@@ -3,6 +3,7 @@
 #pragma once
 
 #include <string>
+#include <vector>
 
 #include "tvx_guess.h"
 
@@ -35,5 +36,23 @@ enum class AnswerKind { kPassword, kShortName, kName, kOther };
 // names `label` and the character, e.g. "--password holds a carriage return".
 std::string CheckAnswer(const GuessResult &guess, const char *label, const std::string &text,
                         AnswerKind kind, bool forIni);
+
+// AnswerReport is what an answer-file command tells at its end.
+struct AnswerReport {
+  const char *cmd;               // "unattended linux"
+  const std::string *image;
+  const GuessResult *guess;
+  bool ok;
+  bool supported;
+  const bool *imageListed;       // optional: Windows commands say it
+  const std::vector<std::string> *files;  // what was written, in order
+  const std::vector<std::string> *log;    // the library's reasons
+  const char *failure;           // "the answer files were not written"
+};
+
+// ReportAnswers prints the report (one JSON object with `json`, else lines
+// for people, the failure and its reasons on standard error) and returns the
+// exit status: 0 done, 1 failed.
+int ReportAnswers(const AnswerReport &r, bool json);
 
 }  // namespace tvxcli

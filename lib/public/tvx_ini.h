@@ -43,6 +43,18 @@
  *     disk included) the old file stays as it was and the temporary file is
  *     removed. The file's inode therefore changes on every successful write.
  *
+ * What a caller must check before writing (the format's own rules, kept
+ * as they are; the writer still returns TRUE in each case)
+ *  - Values are written as given: a CR or LF inside a value starts a new line
+ *    that readers take as a key or a section of its own, and a double quote
+ *    inside a quoted value ends it early. Refuse such values first.
+ *  - A ";" inside a value is written, but every reader here cuts the value
+ *    at it (quoted or not): the value does not read back whole.
+ *  - A value too long for its line (about 1,000 bytes: 1,020 minus the key
+ *    and "=") is clipped, and the call still returns TRUE.
+ *  - Replacing a key on a CRLF line writes the new line with "\n" alone; the
+ *    other lines keep their CRLF.
+ *
  * Concurrency: no locking; callers serialise writers of one file.
  */
 #ifndef TVX_INI_H

@@ -6,6 +6,11 @@
  * must not write to the host's standard streams. A host that wants them
  * installs its own sink; the command-line tool's -v installs one that prints
  * to standard error.
+ *
+ * A sink may receive secrets. Some diagnostics quote the user's answers as
+ * they were given, among them a line that names the administrator password
+ * when it cannot be written into an answer file. Treat the sink's output as
+ * confidential: do not forward it to shared logs without filtering.
  */
 #ifndef TVX_LOG_H
 #define TVX_LOG_H

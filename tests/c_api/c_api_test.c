@@ -47,6 +47,9 @@ static void TestUdf(void) {
   CHECK(UDF_OpenWithReader(NULL, NULL, NULL) == NULL);
   CHECK(UDF_CloseDir(NULL) == FALSE);
   CHECK(UDF_GetVolumeId(NULL) == NULL);
+  CHECK(UDF_ListTree(NULL, "", TRUE, NULL, NULL) == UDF_TREE_ERR_ARGUMENT);
+  CHECK(UDF_Extract(NULL, "", "/tmp") == UDF_TREE_ERR_ARGUMENT);
+  CHECK(Iso9660_ListTree(NULL, "", TRUE, NULL, NULL) == ISO9660_ERR_ARGUMENT);
   UDF_Close(NULL);
 }
 

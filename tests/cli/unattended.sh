@@ -74,7 +74,9 @@ done
 "$tool" unattended frobnicate >/dev/null 2>&1; check "unknown unattended subcommand" 64 $?
 "$tool" unattended support --help | grep -q "Exit status"; check "support --help" 0 $?
 
-# Every sample image: the JSON parses and agrees with the exit status.
+# Two images of each family: the JSON parses and agrees with the exit status.
+# (Recognition of every image is the detect test's job; one process start per
+# image here would cost minutes of sanitizer start-up for nothing new.)
 if [ -n "$media" ] && [ -d "$media" ]; then
   while IFS= read -r -d '' img; do
     out=$("$tool" unattended support --json "$img" 2>/dev/null); st=$?
@@ -82,7 +84,7 @@ if [ -n "$media" ] && [ -d "$media" ]; then
     want=$([ $st -eq 0 ] && echo true || echo false)
     check "support ${img#"$media"/}: $(json_field "$out" guestOS)" "$st" "$st" \
       "$(json_field "$out" supported)" "$want"
-  done < <(find "$media" -name '*.iso' -print0 | sort -z)
+  done < <(for d in "$media"/*/; do find "$d" -name '*.iso' -print0 | sort -z | head -z -n 2; done)
 fi
 
 [ $fails -eq 0 ] && echo "unattended: all checks passed"

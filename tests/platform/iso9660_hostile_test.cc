@@ -420,32 +420,6 @@ TEST(Iso9660Hostile, DataBeyondTheEnd) {
   EXPECT_FALSE(Exists(tmp.Join("d/A")));
 }
 
-TEST(Iso9660Hostile, ExactCaseWinsOverCaselessMatch) {
-  IsoBuilder b;
-  uint32_t data = b.NewBlocks(1);
-  b.PutBlock(data, "0123456789");
-  b.SetRoot(kRoot, b.Dir(kRoot, kRoot,
-                         {{"abc", data, 1, 0, ""}, {"ABC", data, 2, 0, ""}, {"Abc", data, 3, 0, ""}}));
-  Image img;
-  img.bytes = b.Bytes();
-  ASSERT_EQ(img.Open(), ISO9660_OK);
-  struct Case {
-    const char *name;
-    size_t size;
-  } cases[] = {{"abc", 1}, {"ABC", 2}, {"Abc", 3}, {"aBC", 1}};
-  for (const Case &c : cases) {
-    Iso9660DirEntry e{};
-    std::strcpy(e.name, c.name);
-    Iso9660File *f = nullptr;
-    ASSERT_EQ(Iso9660_OpenFile(img.image, &e, &f), ISO9660_OK) << c.name;
-    char buf[16];
-    size_t n = sizeof buf;
-    EXPECT_EQ(Iso9660_ReadFile(img.image, f, buf, &n), ISO9660_OK);
-    EXPECT_EQ(n, c.size) << c.name;
-    Iso9660_CloseFile(img.image, f);
-  }
-}
-
 // Every prefix of a real image: whatever is cut off, the reader answers with
 // a result code.
 TEST(Iso9660Hostile, EveryTruncationOfARealImage) {

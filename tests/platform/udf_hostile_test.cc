@@ -382,30 +382,3 @@ TEST(UdfHostile, EveryTruncationAndEveryBrokenTag) {
   }
 }
 
-TEST(UdfBuilt, OffsetsBeyondFourGiB) {
-  // 5 GiB of unrecorded extents, then recorded bytes: the size and every
-  // offset need 64 bits, and the holes read as zeros.
-  const uint64_t hole = uint64_t{5} << 30;
-  UdfNodeSpec root{"", true, "", {}};
-  root.children.push_back({"huge.bin", false, "tail bytes", {}, hole});
-  for (bool meta : {false, true}) {
-    UdfBuildOptions opt;
-    opt.metadataPartition = meta;
-    UdfLayout layout;
-    std::vector<uint8_t> img = tvxtest::BuildUdf(root, opt, &layout);
-    int closes = 0;
-    UDFVolume *vol = OpenBytes(img, &closes);
-    ASSERT_NE(vol, nullptr);
-    UDFFile *f = UDF_OpenFile(vol, nullptr, "huge.bin");
-    ASSERT_NE(f, nullptr);
-    EXPECT_EQ(UDF_GetFileSize(vol, f), hole + 10);
-    char buf[14];
-    ASSERT_TRUE(UDF_PReadFile(f, buf, hole - 4, sizeof buf));
-    EXPECT_EQ(std::string(buf, sizeof buf), std::string(4, '\0') + "tail bytes");
-    ASSERT_TRUE(UDF_PReadFile(f, buf, (uint64_t{1} << 32) + 7, 4));
-    EXPECT_EQ(std::string(buf, 4), std::string(4, '\0'));
-    EXPECT_FALSE(UDF_PReadFile(f, buf, hole + 5, 6));
-    UDF_CloseFile(f);
-    UDF_Close(vol);
-  }
-}

@@ -17,41 +17,12 @@ namespace {
 
 std::string Image(const char *name) { return tvxtest::MediaDir() + "/udf/" + name; }
 
-// The generated file the media script adds to the tree.
-std::string BigPattern() {
-  std::string block(4096, '\0');
-  for (int i = 0; i < 4096; i++) block[i] = static_cast<char>((i * 7 + i / 251) & 0xFF);
-  std::string all;
-  for (int i = 0; i < 75; i++) all += block;
-  return all;
-}
-
 struct VolumeCloser {
   void operator()(UDFVolume *v) const { UDF_Close(v); }
 };
 using VolumePtr = std::unique_ptr<UDFVolume, VolumeCloser>;
 
 }  // namespace
-
-TEST(UdfMedia, ReadsTheSourceTree) {
-  std::string src = tvxtest::SourceDir() + "/tests/data/udf/tree";
-  tvxtest::UdfTree want;
-  for (const auto &e : fs::recursive_directory_iterator(src)) {
-    std::string rel = fs::relative(e.path(), src).string();
-    if (e.is_directory()) {
-      want.dirs[rel] = true;
-    } else {
-      want.files[rel] = tvxtest::ReadFileOrDie(e.path().string());
-    }
-  }
-  want.files["sources/big.bin"] = BigPattern();
-  bool opened = false;
-  tvxtest::UdfTree got = tvxtest::WalkUdfImage(Image("udf-only.iso"), &opened);
-  ASSERT_TRUE(opened);
-  EXPECT_EQ(got.failures, 0);
-  EXPECT_EQ(got.dirs, want.dirs);
-  EXPECT_TRUE(got.files == want.files);
-}
 
 TEST(UdfMedia, EmptyVolumeOfEachRevision) {
   const struct {
@@ -136,63 +107,3 @@ TEST_F(UdfApi, OpenFileResolvesPathsExactly) {
   UDF_CloseDir(ab);
 }
 
-TEST_F(UdfApi, DirectoryListing) {
-  UDFDir *root = UDF_OpenDir(vol_.get(), nullptr, "");
-  ASSERT_NE(root, nullptr);
-  std::map<std::string, std::pair<bool, uint64_t>> seen;
-  while (const char *name = UDF_ReadDir(root, 0)) {
-    seen[name] = {UDF_DirEntryIsDir(root) != 0, UDF_DirEntrySize(root)};
-  }
-  EXPECT_EQ(seen.size(), 5u);
-  EXPECT_EQ(seen["README.TXT"], std::make_pair(false, uint64_t{16}));
-  EXPECT_EQ(seen["empty.bin"], std::make_pair(false, uint64_t{0}));
-  EXPECT_TRUE(seen["sources"].first);
-  EXPECT_EQ(UDF_DirEntrySize(root), UINT64_MAX);  // nothing returned last
-  UDF_RewindDir(root);
-  const char *first = UDF_ReadDir(root, 0);
-  ASSERT_NE(first, nullptr);
-  EXPECT_EQ(seen.count(first), 1u);
-  // A directory handle is a starting point for relative opens.
-  UDFDir *sub = UDF_OpenDir(vol_.get(), root, "sources/en-us");
-  ASSERT_NE(sub, nullptr);
-  EXPECT_STREQ(UDF_ReadDir(sub, 0), "lang.ini");
-  EXPECT_EQ(ReadAll(sub, "lang.ini"), "lang=en-us\n");
-  EXPECT_TRUE(UDF_CloseDir(sub));
-  EXPECT_TRUE(UDF_CloseDir(root));
-  EXPECT_FALSE(UDF_CloseDir(nullptr));
-  EXPECT_EQ(UDF_OpenDir(vol_.get(), nullptr, "README.TXT"), nullptr);
-  EXPECT_EQ(UDF_OpenDir(vol_.get(), nullptr, "nothing"), nullptr);
-}
-
-TEST_F(UdfApi, InterleavedReadsAreIndependent) {
-  const std::string big = BigPattern();
-  UDFFile *a = UDF_OpenFile(vol_.get(), nullptr, "sources/big.bin");
-  UDFFile *b = UDF_OpenFile(vol_.get(), nullptr, "sources/big.bin");
-  UDFFile *c = UDF_OpenFile(vol_.get(), nullptr, "README.TXT");
-  ASSERT_TRUE(a && b && c);
-  // a walks forward, b backward, c in between: no shared position.
-  const size_t chunk = 3000;
-  for (size_t i = 0; i * chunk < big.size(); i++) {
-    size_t offA = i * chunk;
-    size_t offB = big.size() - std::min(big.size(), (i + 1) * chunk);
-    char bufA[chunk], bufB[chunk], bufC[16];
-    size_t nA = std::min(chunk, big.size() - offA);
-    size_t nB = std::min(chunk, big.size() - i * chunk);
-    ASSERT_TRUE(UDF_PReadFile(a, bufA, offA, nA));
-    ASSERT_TRUE(UDF_PReadFile(c, bufC, 0, sizeof bufC));
-    ASSERT_TRUE(UDF_PReadFile(b, bufB, offB, nB));
-    ASSERT_EQ(std::string(bufA, nA), big.substr(offA, nA));
-    ASSERT_EQ(std::string(bufB, nB), big.substr(offB, nB));
-    ASSERT_EQ(std::string(bufC, sizeof bufC), "UDF test medium\n");
-  }
-  // Reads past the end fail whole; a read of nothing at the end succeeds.
-  char byte;
-  EXPECT_FALSE(UDF_PReadFile(a, &byte, big.size(), 1));
-  char small[16];
-  EXPECT_FALSE(UDF_PReadFile(c, small, 10, 7));
-  EXPECT_TRUE(UDF_PReadFile(a, &byte, big.size(), 0));
-  EXPECT_EQ(UDF_GetFileSize(vol_.get(), nullptr), UINT64_MAX);
-  UDF_CloseFile(a);
-  UDF_CloseFile(b);
-  UDF_CloseFile(c);
-}

@@ -1,0 +1,137 @@
+# The sources of the library and of the command, named one by one: a file
+# only joins the build when it is listed here (and check_sources_listed
+# refuses to configure while a source in the tree is not).
+set(TVX_LIBRARY_SOURCES
+  lib/guessGuest/guess.cc
+  lib/guessGuest/guess_bsd_netware.cc
+  lib/guessGuest/guess_debian.cc
+  lib/guessGuest/guess_macos.cc
+  lib/guessGuest/guess_mandriva.cc
+  lib/guessGuest/guess_medium.cc
+  lib/guessGuest/guess_orka.cc
+  lib/guessGuest/guess_redhat.cc
+  lib/guessGuest/guess_solaris.cc
+  lib/guessGuest/guess_suse.cc
+  lib/guessGuest/guess_turbolinux_lumen.cc
+  lib/guessGuest/guess_windows_nt.cc
+  lib/guessGuest/guess_windows_vista.cc
+  lib/guessGuest/guess_windows_vista_lists.cc
+  lib/guestInstall/autoinstall_boot_tree.cc
+  lib/guestInstall/autoinstall_config.cc
+  lib/guestInstall/autoinstall_crypt.cc
+  lib/guestInstall/autoinstall_floppy.cc
+  lib/guestInstall/autoinstall_isolinux.cc
+  lib/guestInstall/autoinstall_kickstart.cc
+  lib/guestInstall/autoinstall_linux.cc
+  lib/guestInstall/autoinstall_linux_media.cc
+  lib/guestInstall/autoinstall_linux_table.cc
+  lib/guestInstall/autoinstall_linux_templates.cc
+  lib/guestInstall/autoinstall_sha256.cc
+  lib/guestInstall/autoinstall_validate.cc
+  lib/guestInstall/autoinstall_windows.cc
+  lib/guestInstall/autoinstall_windows_floppy.cc
+  lib/guestInstall/autoinstall_windows_names.cc
+  lib/guestInstall/autoinstall_windows_xml.cc
+  lib/guestInstall/autoinstall_windows_xml_ops.cc
+  lib/ini/ini_line.cc
+  lib/ini/ini_read.cc
+  lib/ini/ini_write.cc
+  lib/signature/zelsign_load.cc
+  lib/signature/zelsign_store.cc
+  lib/signature/zelsign_verify.cc
+  lib/toolsImage/toolsiso_file.cc
+  lib/toolsImage/toolsiso_hashdata.cc
+  lib/toolsImage/toolsiso_localfile.cc
+  lib/toolsImage/toolsiso_select.cc
+  lib/toolsImage/toolsiso_sources.cc
+  lib/toolsImage/toolsiso_verify.cc
+  lib/toolsversion/toolsversion_api.cc
+  lib/toolsversion/toolsversion_evaluate.cc
+  lib/toolsversion/toolsversion_host.cc
+  lib/toolsversion/toolsversion_manifest.cc
+  lib/toolsversion/toolsversion_save.cc
+  lib/toolsversion/toolsversion_status.cc
+  lib/toolsversion/toolsversion_xml.cc
+  platform/blocksource.cc
+  platform/crypto.cc
+  platform/dictionary.cc
+  platform/dictionary_text.cc
+  platform/disklib.cc
+  platform/dynbuf.cc
+  platform/fat/directory.cc
+  platform/fat/file.cc
+  platform/fat/volume.cc
+  platform/fd_io.cc
+  platform/file.cc
+  platform/file_replace.cc
+  platform/fileio.cc
+  platform/guestos.cc
+  platform/hashtable.cc
+  platform/http.cc
+  platform/iso9660/binding.cc
+  platform/iso9660/file.cc
+  platform/iso9660/image.cc
+  platform/iso9660/names.cc
+  platform/iso9660/tree.cc
+  platform/iso9660/volume.cc
+  platform/log.cc
+  platform/media_tree.cc
+  platform/msg.cc
+  platform/msg_load.cc
+  platform/msglist.cc
+  platform/process.cc
+  platform/snapshot.cc
+  platform/str.cc
+  platform/timeutil.cc
+  platform/udf/directory.cc
+  platform/udf/icb.cc
+  platform/udf/partitions.cc
+  platform/udf/tags.cc
+  platform/udf/tree.cc
+  platform/udf/udf_api.cc
+  platform/udf/volume.cc
+  platform/unicode.cc
+  platform/util.cc
+  platform/version.cc
+  platform/vthread.cc
+)
+
+set(TVX_TOOL_SOURCES
+  tools/cmd_crypt.cc
+  tools/cmd_detect.cc
+  tools/cmd_floppy.cc
+  tools/cmd_hashdata.cc
+  tools/cmd_media.cc
+  tools/cmd_signature.cc
+  tools/cmd_tools.cc
+  tools/cmd_tools_status.cc
+  tools/cmd_tools_verify.cc
+  tools/cmd_unattended.cc
+  tools/cmd_unattended_linux.cc
+  tools/cmd_unattended_scan.cc
+  tools/cmd_unattended_validate.cc
+  tools/cmd_unattended_windows.cc
+  tools/cmd_windows_name.cc
+  tools/command_group.cc
+  tools/floppy_cli.cc
+  tools/hashdata_writer.cc
+  tools/json.cc
+  tools/log_lines.cc
+  tools/main.cc
+  tools/progress.cc
+  tools/staged_output.cc
+  tools/unattended_common.cc
+  tools/unattended_linux_media.cc
+)
+
+function(check_sources_listed)
+  file(GLOB_RECURSE found RELATIVE ${PROJECT_SOURCE_DIR}
+       ${PROJECT_SOURCE_DIR}/lib/*.cc ${PROJECT_SOURCE_DIR}/platform/*.cc
+       ${PROJECT_SOURCE_DIR}/tools/*.cc)
+  foreach(f IN LISTS found)
+    if(NOT f IN_LIST TVX_LIBRARY_SOURCES AND NOT f IN_LIST TVX_TOOL_SOURCES)
+      message(FATAL_ERROR "${f} is in the tree but in no list of cmake/sources.cmake: "
+                          "list it there, or remove it")
+    endif()
+  endforeach()
+endfunction()
