@@ -5,11 +5,7 @@
 # failing calls that leave nothing behind.
 set -uo pipefail
 tool=${TVX_TOOL:?} media=${TVX_MEDIA_DIR:?}
-fail=0
-check() {  # check WHAT COND...
-  local what=$1; shift
-  if "$@"; then echo "ok: $what"; else echo "FAIL: $what"; fail=1; fi
-}
+. "$(dirname "$0")/lib/check.sh"
 if ! "$tool" unattended linux --help >/dev/null 2>&1; then
   echo "skip: this tool has no 'unattended linux' command"
   exit 0
@@ -92,4 +88,4 @@ for salt in 'rounds=1$x' 'rounds=999$abcdefghijklmnopq'; do  # clamped to 1000, 
 done
 "$tool" crypt --check "$hash" wrong >/dev/null
 check "crypt: a wrong password does not match (exit 1)" test $? -eq 1
-exit $fail
+exit $((fails > 0))

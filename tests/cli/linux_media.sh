@@ -4,11 +4,7 @@
 # back with isoinfo, and the floppy checked with fsck.fat and mtools.
 set -uo pipefail
 tool=${TVX_TOOL:?}
-fail=0
-check() {  # check WHAT COND...
-  local what=$1; shift
-  if "$@"; then echo "ok: $what"; else echo "FAIL: $what"; fail=1; fi
-}
+. "$(dirname "$0")/lib/check.sh"
 tmp=$(mktemp -d)
 trap 'rm -rf "$tmp"' EXIT
 bin=/usr/lib/ISOLINUX/isolinux.bin ldlinux=/usr/lib/syslinux/modules/bios/ldlinux.c32
@@ -138,4 +134,4 @@ if "$tool" unattended linux --help >/dev/null 2>&1; then
   MTOOLS_SKIP_CHECK=1 mcopy -n -i "$tmp/ubmedia/autoinst.flp" ::preseed.cfg "$tmp/preseed.back" 2>/dev/null
   check "preseed.cfg on the floppy is the answer file" cmp -s "$tmp/ubans/custom/preseed.cfg" "$tmp/preseed.back"
 fi
-exit $fail
+exit $((fails > 0))

@@ -6,12 +6,7 @@ media=${TVX_MEDIA_DIR:?}/iso9660
 src=${TVX_SOURCE_DIR:?}
 work=$(mktemp -d)
 trap 'rm -rf "$work"' EXIT
-fails=0
-check() {  # check DESCRIPTION COMMAND...
-  local what=$1
-  shift
-  if "$@"; then echo "ok   $what"; else echo "FAIL $what"; fails=$((fails + 1)); fi
-}
+. "$(dirname "$0")/lib/check.sh"
 status() {  # status EXPECTED COMMAND...: the command's exit status is EXPECTED
   local want=$1
   shift

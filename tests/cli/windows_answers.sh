@@ -4,11 +4,7 @@
 # the library's reasons on failure.
 set -uo pipefail
 tool=${TVX_TOOL:?} media=${TVX_MEDIA_DIR:?} src=${TVX_SOURCE_DIR:?}
-fail=0
-check() {  # check WHAT COND...
-  local what=$1; shift
-  if "$@"; then echo "ok: $what"; else echo "FAIL: $what"; fail=1; fi
-}
+. "$(dirname "$0")/lib/check.sh"
 if ! "$tool" unattended windows --help >/dev/null 2>&1; then
   echo "skip: this tool has no 'unattended windows' command"
   exit 0
@@ -43,25 +39,17 @@ if usable "$win10"; then
   check "win10: exit 0" test $? -eq 0
   check "win10: names the three files" test "$(grep -c '^wrote ' "$tmp/out")" -eq 3
   xml=$tmp/w10/autoun~0.xml
-  check "win10: xmllint accepts the XML" xmllint --noout "$xml"
   check "win10: account name intact" \
     test "$(xpath "$xml" "$oobe/$(el AutoLogon)/$(el Username)")" = "$name"
   check "win10: password intact" \
     test "$(xpath "$xml" "$oobe/$(el AutoLogon)/$(el Password)/$(el Value)")" = "${password//\"/}"
   check "win10: planted link untouched" test "$(cat "$tmp/victim")" = keep -a ! -L "$tmp/w10/winnt.sif"
   check "win10: files private" test "$(stat -c %a "$tmp/w10/winnt.sif" "$xml" "$tmp/w10/storePwd.ini" | sort -u)" = 600
-  check "win10: host time zone" \
-    test "$(xpath "$xml" "$oobe/$(el TimeZone)")" = "Tokyo Standard Time"
-  check "win10: four first-logon commands" \
-    test "$(xpath "$xml" "count($oobe/$(el FirstLogonCommands)/*)")" = 4
-  check "win10: winnt.sif time-zone index" grep -qx 'TimeZone=235' "$tmp/w10/winnt.sif"
-  check "win10: winnt.sif name in windows-1252" \
-    grep -q "^FullName=\"Jo & O'Neil J$(printf '\374')rgen\"" "$tmp/w10/winnt.sif"
 
   # Texts that would add keys to winnt.sif are refused before anything is
   # written: exit 1, the character named, nothing new in --out.
-  for bad in "--password=$password" $'--password=pw\rAutoLogon=Yes' $'--product-key=K\rX=1' \
-      $'--full-name=Bob\nX' "--full-name=$(printf 'n%.0s' {1..60})"; do
+  # (Each refused character has its row in the library's own test.)
+  for bad in $'--password=pw\rAutoLogon=Yes' "--full-name=$(printf 'n%.0s' {1..60})"; do
     answers "$tmp/inj" "$win10" --image-name "Windows 10 Pro" "$bad" >/dev/null 2>"$tmp/err"
     check "refused ${bad%%=*}: exit 1" test $? -eq 1
     check "refused ${bad%%=*}: reason" grep -qE 'holds|longer than' "$tmp/err"
@@ -114,4 +102,4 @@ check "missing --sif: exit 64" test $? -eq 64
 check "missing --sif: says so" grep -q -- '--sif is required' "$tmp/err"
 "$tool" unattended windows --help | grep -q -- '--keep-partitions'
 check "help lists the options" test $? -eq 0
-exit $fail
+exit $((fails > 0))
