@@ -123,12 +123,6 @@ TEST_F(ToolsVersionImage, GuestAgainstSignedImageAndAvr) {
       // monolithic version.
       {"current", Fault::kGood, "monolithic.version = 12.2.0\n", TOOLS_STATUS_CURRENT,
        "ToolsVersion: missing from the guest  : (  1) vmci\n"},
-      {"below the AVR minimum", Fault::kGood, "monolithic.version = 11.9\n", TOOLS_STATUS_TOO_OLD,
-       "ToolsVersion: Status is too old because this is status of monolithic version.\n"},
-      {"above the AVR maximum", Fault::kGood, "monolithic.version = 13\n", TOOLS_STATUS_TOO_NEW,
-       "ToolsVersion: Status is too new because this is status of monolithic version.\n"},
-      {"blacklisted", Fault::kGood, "monolithic.version = 12.1.1\n", TOOLS_STATUS_BLACKLISTED,
-       "ToolsVersion: Status is blacklisted because this is status of monolithic version.\n"},
       {"older but supported", Fault::kGood, "monolithic.version = 12.1\n",
        TOOLS_STATUS_SUPPORTED_OLD,
        "ToolsVersion: Status is supported old because this is status of monolithic version, and "

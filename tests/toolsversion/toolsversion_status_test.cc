@@ -13,27 +13,13 @@
 
 #include "platform/xml_unique.h"
 #include "support/log_capture.h"
+#include "support/run_argv.h"
 #include "tvx_toolsversion.h"
 
 namespace {
 
 using tvxtest::TempDir;
 using tvxtest::WriteFileOrDie;
-
-// A sparse disk made by qemu-img, its disk database's tools version patched.
-std::string MakeDisk(const TempDir &t, const std::string &name, unsigned toolsVersion) {
-  std::string path = t.Join(name);
-  std::string cmd = "qemu-img create -q -f vmdk '" + path + "' 1M";
-  if (std::system(cmd.c_str()) != 0) return "";
-  std::string bytes = tvxtest::ReadFileOrDie(path);
-  size_t at = bytes.find("ddb.toolsVersion = \"2147483647\"");
-  if (at == std::string::npos) return "";
-  char digits[11];
-  std::snprintf(digits, sizeof digits, "%010u", toolsVersion);
-  bytes.replace(at + 20, 10, digits);
-  WriteFileOrDie(path, bytes);
-  return path;
-}
 
 class ToolsVersionStatus : public ::testing::Test {
  protected:
@@ -57,8 +43,8 @@ class ToolsVersionStatus : public ::testing::Test {
 };
 
 TEST_F(ToolsVersionStatus, LegacyNumberAgainstTheGuestsLimits) {
-  std::string disk9216 = MakeDisk(dir_, "a.vmdk", 9216);
-  std::string disk10252 = MakeDisk(dir_, "b.vmdk", 10252);
+  std::string disk9216 = tvxtest::MakeSparseVmdk(dir_.Join("a.vmdk"), 9216);
+  std::string disk10252 = tvxtest::MakeSparseVmdk(dir_.Join("b.vmdk"), 10252);
   ASSERT_FALSE(disk9216.empty() || disk10252.empty()) << "qemu-img is needed";
   const std::string xp = "guestOS = \"winXPPro\"\n";
   const std::string disks =
