@@ -67,23 +67,6 @@ TEST(AutoInstallConfig, WindowsRows) {
   }
 }
 
-TEST(AutoInstallConfig, LinuxRowForEveryGuest) {
-  for (const char *os : {"ubuntu-64", "rhel8-64", "winXPPro", "anything"}) {
-    GuessResult g = Guess(os);
-    AutoInstallConfigInfo info;
-    std::memset(&info, 0xAB, sizeof info);
-    ASSERT_TRUE(AutoInstall_GetInstallConfigInfo("linux", &g, &info)) << os;
-    EXPECT_EQ(32u, info.shortNameMaxLength);
-    EXPECT_EQ(52u, info.nameMaxLength);
-    EXPECT_EQ(127u, info.passwordMaxLength);
-    EXPECT_EQ(std::vector<std::string>{"root"}, Names(info.reservedShortNames));
-    EXPECT_EQ(nullptr, info.reservedNames);
-    const Bool family[4] = {0, 1, 1, 1}, guest[2] = {0, 0};
-    EXPECT_EQ(0, std::memcmp(family, info.familyFlags, 4));
-    EXPECT_EQ(0, std::memcmp(guest, info.guestFlags, 2));
-  }
-}
-
 TEST(AutoInstallConfig, RefusalsLeaveInfoUntouched) {
   GuessResult g = Guess("winXPPro"), none = Guess(nullptr);
   AutoInstallConfigInfo info, before;
