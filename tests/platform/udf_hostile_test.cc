@@ -4,7 +4,6 @@
 // deliver them.
 #include <gtest/gtest.h>
 
-#include <cstring>
 #include <filesystem>
 #include <functional>
 
@@ -19,28 +18,7 @@ using tvxtest::UdfNodeSpec;
 
 namespace {
 
-struct MemImage {
-  std::vector<uint8_t> bytes;
-  int *closes;
-};
-
-Bool ReadMem(void *h, void *buf, size_t len, uint64_t off) {
-  auto *m = static_cast<MemImage *>(h);
-  if (off > m->bytes.size() || len > m->bytes.size() - off) return FALSE;
-  std::memcpy(buf, m->bytes.data() + off, len);
-  return TRUE;
-}
-
-Bool CloseMem(void *h) {
-  auto *m = static_cast<MemImage *>(h);
-  (*m->closes)++;
-  delete m;
-  return TRUE;
-}
-
-UDFVolume *OpenBytes(const std::vector<uint8_t> &img, int *closes) {
-  return UDF_OpenWithReader(ReadMem, CloseMem, new MemImage{img, closes});
-}
+using tvxtest::OpenUdfBytes;
 
 void Expected(const UdfNodeSpec &n, const std::string &path, tvxtest::UdfTree *t) {
   for (const UdfNodeSpec &c : n.children) {
@@ -65,7 +43,7 @@ tvxtest::UdfTree Expected(const UdfNodeSpec &root) {
 int WalkNeverLies(const std::vector<uint8_t> &img, const tvxtest::UdfTree &want, bool *opened) {
   int failures = -1;
   int closes = 0;
-  UDFVolume *vol = OpenBytes(img, &closes);
+  UDFVolume *vol = OpenUdfBytes(img, &closes);
   *opened = vol != nullptr;
   if (vol != nullptr) {
     tvxtest::UdfTree got = tvxtest::WalkUdf(vol);
@@ -122,7 +100,7 @@ TEST(UdfBuilt, ReadsEveryLayout) {
     UdfLayout layout;
     std::vector<uint8_t> img = tvxtest::BuildUdf(tree, c.opt, &layout);
     int closes = 0;
-    UDFVolume *vol = OpenBytes(img, &closes);
+    UDFVolume *vol = OpenUdfBytes(img, &closes);
     ASSERT_NE(vol, nullptr);
     char *id = UDF_GetVolumeId(vol);
     EXPECT_STREQ(id, "TVXBUILT");
@@ -287,7 +265,7 @@ TEST(UdfHostile, NamesThatLeaveTheTreeAreHidden) {
   std::vector<uint8_t> img = tvxtest::BuildUdf(root, {}, &layout);
   tvxtest::LogCapture log;
   int closes = 0;
-  UDFVolume *vol = OpenBytes(img, &closes);
+  UDFVolume *vol = OpenUdfBytes(img, &closes);
   ASSERT_NE(vol, nullptr);
   tvxtest::UdfTree got = tvxtest::WalkUdf(vol);
   EXPECT_EQ(got.files.size(), 1u);
@@ -312,7 +290,7 @@ TEST(UdfHostile, DirectoryLoopAndDeepNestingAreBounded) {
   tvxtest::SealTag(&img, fid);
   tvxtest::LogCapture log;
   int closes = 0;
-  UDFVolume *vol = OpenBytes(img, &closes);
+  UDFVolume *vol = OpenUdfBytes(img, &closes);
   ASSERT_NE(vol, nullptr);
   EXPECT_EQ(UDF_OpenDir(vol, nullptr, "loop"), nullptr);
   EXPECT_EQ(UDF_OpenDir(vol, nullptr, "loop/loop/loop"), nullptr);
@@ -328,7 +306,7 @@ TEST(UdfHostile, DirectoryLoopAndDeepNestingAreBounded) {
     path += path.empty() ? "d" : "/d";
   }
   img = tvxtest::BuildUdf(deep, {}, &layout);
-  vol = OpenBytes(img, &closes);
+  vol = OpenUdfBytes(img, &closes);
   ASSERT_NE(vol, nullptr);
   UDFDir *ok = UDF_OpenDir(vol, nullptr, path.substr(0, 2 * 200 - 1).c_str());
   EXPECT_NE(ok, nullptr);
