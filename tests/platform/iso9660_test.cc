@@ -106,20 +106,4 @@ TEST(Iso9660Media, EntryRecordsOpenFiles) {
   EXPECT_EQ(f, nullptr);
 }
 
-TEST(Iso9660Media, NullArgumentsAreRefused) {
-  Iso9660Image *image = nullptr;
-  uint32_t formats = 0;
-  EXPECT_EQ(Iso9660_Open(nullptr, 0, &image), ISO9660_ERR_ARGUMENT);
-  EXPECT_EQ(Iso9660_Open("x", 0, nullptr), ISO9660_ERR_ARGUMENT);
-  EXPECT_EQ(Iso9660_ListFormats(nullptr, &formats), ISO9660_ERR_ARGUMENT);
-  EXPECT_EQ(Iso9660_OpenWithReader(nullptr, nullptr, nullptr, 0, &image), ISO9660_ERR_ARGUMENT);
-  EXPECT_EQ(Iso9660_Close(nullptr), ISO9660_ERR_ARGUMENT);
-  Iso9660Dir *d = nullptr;
-  EXPECT_EQ(Iso9660_OpenDir(nullptr, "/", &d), ISO9660_ERR_ARGUMENT);
-  size_t n = 5;
-  EXPECT_EQ(Iso9660_ReadFile(nullptr, nullptr, nullptr, &n), ISO9660_ERR_ARGUMENT);
-  EXPECT_EQ(n, 0u);
-  EXPECT_EQ(Iso9660_Extract(nullptr, "/", "/tmp"), ISO9660_ERR_ARGUMENT);
-}
-
 }  // namespace
