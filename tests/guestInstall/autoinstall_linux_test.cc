@@ -43,13 +43,6 @@ Ran RunIn(const std::vector<std::string> &argv, const std::string &cwd) {
   return r;
 }
 
-std::string Read(const std::string &path) {
-  std::ifstream in(path, std::ios::binary);
-  std::stringstream ss;
-  ss << in.rdbuf();
-  return ss.str();
-}
-
 std::vector<std::string> Lines(const std::string &text) {
   std::vector<std::string> out;
   std::stringstream ss(text);
@@ -106,7 +99,7 @@ class LinuxAnswers : public ::testing::Test {
                                                  fullName.c_str(), password.c_str(),
                                                  rootPassword.c_str(), key, powerOff, 0, nvme);
     p.path = tvx::autoinstall::LinuxAnswerFilePath(KindOf(guestOS), out.c_str());
-    p.text = Read(p.path);
+    p.text = p.ok ? tvxtest::ReadFileOrDie(p.path) : "";
     return p;
   }
   static AutoInstallLinuxKind KindOf(const std::string &g) {
@@ -406,7 +399,7 @@ TEST_F(LinuxAnswers, FailuresLeaveNothingBehind) {
   EXPECT_FALSE(AutoInstall_PrepareAnswerFileEx_Linux("ubuntu-64", GUESS_VERSION_UBUNTU_1404,
                                                      (dir_.Path() + "/ub").c_str(), "jo", "Jo", "p",
                                                      "r", nullptr, FALSE, 0, FALSE));
-  EXPECT_EQ(Read(dir_.Path() + "/ub/custom"), "x");
+  EXPECT_EQ(tvxtest::ReadFileOrDie(dir_.Path() + "/ub/custom"), "x");
   EXPECT_EQ(std::distance(fs::directory_iterator(dir_.Path() + "/ub"), fs::directory_iterator()),
             1);
   // Under an output directory that cannot be made, nothing appears.
@@ -414,7 +407,7 @@ TEST_F(LinuxAnswers, FailuresLeaveNothingBehind) {
   EXPECT_FALSE(AutoInstall_PrepareAnswerFileEx_Linux("sles11-64", 0,
                                                      (dir_.Path() + "/plainfile/sub").c_str(), "jo",
                                                      "Jo", "p", "r", nullptr, FALSE, 0, FALSE));
-  EXPECT_EQ(Read(dir_.Path() + "/plainfile"), "x");
+  EXPECT_EQ(tvxtest::ReadFileOrDie(dir_.Path() + "/plainfile"), "x");
 }
 
 // A rewrite replaces the whole file and keeps it private.
