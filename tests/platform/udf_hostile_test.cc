@@ -75,6 +75,19 @@ size_t At(const UdfLayout &l, uint32_t sector, size_t off = 0) {
   return size_t{sector} * l.blockSize + off;
 }
 
+// Sets a 32-bit field of the descriptor at byte `tag` and reseals it.
+void Patch32(std::vector<uint8_t> *img, size_t tag, size_t off, uint32_t value) {
+  tvxtest::PutLe32(img, tag + off, value);
+  tvxtest::SealTag(img, tag);
+}
+
+// Sets a 32-bit field of a descriptor in both volume descriptor sequences,
+// so that the reserve copy cannot stand in.
+void PatchBothSequences(std::vector<uint8_t> *img, const UdfLayout &l, uint32_t sector,
+                        size_t off, uint32_t value) {
+  for (uint32_t s : {sector, sector + 16}) Patch32(img, At(l, s), off, value);
+}
+
 }  // namespace
 
 TEST(UdfBuilt, ReadsEveryLayout) {
@@ -139,36 +152,18 @@ TEST(UdfHostile, MalformedStructuresFailCleanly) {
        },
        0, "UDF: no usable volume descriptor sequence (corrupt structure)\n"},
       {"logical block size lies", {},
-       [&](auto *img, const UdfLayout &l) {
-         for (uint32_t s : {l.lvdSector, l.lvdSector + 16}) {
-           tvxtest::PutLe32(img, At(l, s, 212), 4096);
-           tvxtest::SealTag(img, At(l, s));
-         }
-       },
+       [](auto *img, const UdfLayout &l) { PatchBothSequences(img, l, l.lvdSector, 212, 4096); },
        0, "UDF: logical block size 4096 differs from the sector size 2048\n"},
       {"partition starts past the end", {},
-       [&](auto *img, const UdfLayout &l) {
-         for (uint32_t s : {l.pdSector, l.pdSector + 16}) {
-           tvxtest::PutLe32(img, At(l, s, 188), 0x100000);
-           tvxtest::SealTag(img, At(l, s));
-         }
-       },
+       [](auto *img, const UdfLayout &l) { PatchBothSequences(img, l, l.pdSector, 188, 0x100000); },
        // Callbacks cannot tell the image size, so this shows at the first read.
        0, "UDF: cannot read the file set descriptor (read error)\n"},
       {"partition too short for the root", {},
-       [&](auto *img, const UdfLayout &l) {
-         for (uint32_t s : {l.pdSector, l.pdSector + 16}) {
-           tvxtest::PutLe32(img, At(l, s, 192), 2);
-           tvxtest::SealTag(img, At(l, s));
-         }
-       },
+       [](auto *img, const UdfLayout &l) { PatchBothSequences(img, l, l.pdSector, 192, 2); },
        0, "UDF: cannot read the root directory (corrupt structure)\n"},
       {"partition map table longer than its descriptor", {},
-       [&](auto *img, const UdfLayout &l) {
-         for (uint32_t s : {l.lvdSector, l.lvdSector + 16}) {
-           tvxtest::PutLe32(img, At(l, s, 264), 0xFFFFFF00);
-           tvxtest::SealTag(img, At(l, s));
-         }
+       [](auto *img, const UdfLayout &l) {
+         PatchBothSequences(img, l, l.lvdSector, 264, 0xFFFFFF00);
        },
        0, "UDF: partition map table of 4294967040 bytes does not fit its descriptor\n"},
       {"file set descriptor missing", {},
@@ -196,25 +191,19 @@ TEST(UdfHostile, MalformedStructuresFailCleanly) {
        },
        0, "UDF: cannot read the metadata file of partition 0 (corrupt structure)\n"},
       {"file extent past the end of the image", {},
-       [&](auto *img, const UdfLayout &l) {
-         size_t fe = At(l, l.entrySector.at("big.bin"));
-         tvxtest::PutLe32(img, fe + 176 + 4, 0x7FFFFFF0);
-         tvxtest::SealTag(img, fe);
+       [](auto *img, const UdfLayout &l) {
+         Patch32(img, At(l, l.entrySector.at("big.bin")), 176 + 4, 0x7FFFFFF0);
        },
        1, ""},
       {"size beyond the allocation descriptors", {},
-       [&](auto *img, const UdfLayout &l) {
-         size_t fe = At(l, l.entrySector.at("big.bin"));
-         tvxtest::PutLe32(img, fe + 60, 1);  // 4 GiB more than recorded
-         tvxtest::SealTag(img, fe);
+       [](auto *img, const UdfLayout &l) {  // 4 GiB more than recorded
+         Patch32(img, At(l, l.entrySector.at("big.bin")), 60, 1);
        },
        1, ""},
       {"embedded data longer than its entry",
        {.embedSmallFiles = true},
-       [&](auto *img, const UdfLayout &l) {
-         size_t fe = At(l, l.entrySector.at("README.TXT"));
-         tvxtest::PutLe32(img, fe + 56, 4000);
-         tvxtest::SealTag(img, fe);
+       [](auto *img, const UdfLayout &l) {
+         Patch32(img, At(l, l.entrySector.at("README.TXT")), 56, 4000);
        },
        1, ""},
       {"allocation extent chain loops",
@@ -223,8 +212,7 @@ TEST(UdfHostile, MalformedStructuresFailCleanly) {
          // The first AED's continuation (its third descriptor) points back
          // at itself.
          uint32_t aed = l.aedSectors.at("big.bin").at(0);
-         tvxtest::PutLe32(img, At(l, aed, 24 + 2 * 8 + 4), aed - l.partitionStart);
-         tvxtest::SealTag(img, At(l, aed));
+         Patch32(img, At(l, aed), 24 + 2 * 8 + 4, aed - l.partitionStart);
        },
        1, ""},
       {"file identifier lengths past the directory", {},
@@ -285,9 +273,8 @@ TEST(UdfHostile, DirectoryLoopAndDeepNestingAreBounded) {
   UdfNodeSpec root{"", true, "", {{"loop", true, "", {}}}};
   UdfLayout layout;
   std::vector<uint8_t> img = tvxtest::BuildUdf(root, {}, &layout);
-  size_t fid = At(layout, layout.dirDataSector.at(""), 40);
-  tvxtest::PutLe32(&img, fid + 24, layout.entrySector.at("") - layout.partitionStart);
-  tvxtest::SealTag(&img, fid);
+  Patch32(&img, At(layout, layout.dirDataSector.at(""), 40), 24,
+          layout.entrySector.at("") - layout.partitionStart);
   tvxtest::LogCapture log;
   int closes = 0;
   UDFVolume *vol = OpenUdfBytes(img, &closes);
