@@ -37,9 +37,7 @@ struct FloppyCase {
 
 TEST(MakeFloppyImgLinux, AnswerFileOnTheGuestsFloppy) {
   const FloppyCase cases[] = {
-      {"ubuntu-64", "custom/preseed.cfg", "preseed.cfg", false, true, true, ""},
       {"sles10-64", "autoinst.xml", "autoinst.xml", true, true, true, ""},
-      {"opensuse-64", "autoinst.xml", "autoinst.xml", true, true, true, ""},
       {"mandriva", "auto_i~1.cfg", "auto_i~1.cfg", true, true, true, ""},
       {"centos7-64", "ks.cfg", "", false, true, false, ""},
       {"sles15-64", "autoinst.xml", "", false, true, false, ""},

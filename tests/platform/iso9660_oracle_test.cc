@@ -3,16 +3,14 @@
 // and iso-read and against 7z, which read the same images independently.
 #include <gtest/gtest.h>
 
-#include <array>
-#include <cstdio>
 #include <map>
-#include <memory>
 #include <regex>
 #include <string>
 #include <vector>
 
 #include "support/iso_builder.h"
 #include "support/log_capture.h"
+#include "support/run_argv.h"
 #include "tvx_iso9660.h"
 
 namespace {
@@ -28,19 +26,8 @@ std::ostream &operator<<(std::ostream &os, const Item &i) {
   return os << (i.dir ? "dir" : "file " + std::to_string(i.size));
 }
 
-std::string Quote(const std::string &s) {
-  std::string q = "'";
-  for (char c : s) q += c == '\'' ? std::string("'\\''") : std::string(1, c);
-  return q + "'";
-}
-
-bool RunTool(const std::string &cmd, std::string *out) {
-  std::unique_ptr<FILE, int (*)(FILE *)> p(popen((cmd + " 2>/dev/null").c_str(), "r"), pclose);
-  if (!p) return false;
-  std::array<char, 4096> buf;
-  size_t n;
-  while ((n = fread(buf.data(), 1, buf.size(), p.get())) > 0) out->append(buf.data(), n);
-  return pclose(p.release()) == 0;
+bool RunTool(const std::vector<std::string> &argv, std::string *out) {
+  return tvxtest::RunArgv(argv, out) == 0;
 }
 
 // libcdio and 7z show level-1 names lower-cased or without the trailing dot
@@ -87,7 +74,9 @@ Tree Ours(const std::string &image, uint32_t mode, std::map<std::string, std::st
 
 Tree IsoInfo(const std::string &image, const std::string &flags) {
   std::string out;
-  EXPECT_TRUE(RunTool("iso-info --no-header -q -l " + flags + " -i " + Quote(image), &out)) << image;
+  std::vector<std::string> argv{"iso-info", "--no-header", "-q", "-l", "-i", image};
+  if (!flags.empty()) argv.insert(argv.begin() + 4, flags);
+  EXPECT_TRUE(RunTool(argv, &out)) << image;
   static const std::regex header(R"(^(/.*)/?:$)");
   static const std::regex line(
       R"(^\s+([d-])\s+\[LSN\s+\d+\]\s+(\d+)\s+\w{3} \d{2} \d{4} \d{2}:\d{2}:\d{2}  (.*)$)");
@@ -114,7 +103,7 @@ Tree IsoInfo(const std::string &image, const std::string &flags) {
 
 Tree SevenZip(const std::string &image) {
   std::string out;
-  EXPECT_TRUE(RunTool("7z l -slt -tiso " + Quote(image), &out)) << image;
+  EXPECT_TRUE(RunTool({"7z", "l", "-slt", "-tiso", image}, &out)) << image;
   Tree t;
   size_t body = out.find("\n----------\n");
   if (body == std::string::npos) return t;
@@ -176,8 +165,7 @@ TEST_P(Iso9660Oracle, ListingsAndBytesAgree) {
     // iso-read finds some Rock Ridge files only by their translated ISO
     // name (lower case, no trailing dot); try that spelling second.
     auto read = [&](const std::string &p) {
-      return RunTool("iso-read -i " + Quote(image) + " -e " + Quote("/" + p) + " -o " + Quote(out),
-                     &junk);
+      return RunTool({"iso-read", "-i", image, "-e", "/" + p, "-o", out}, &junk);
     };
     ASSERT_TRUE(read(Fold(path, plain)) || read(Fold(path, true))) << path;
     EXPECT_EQ(tvxtest::ReadFileOrDie(out), bytes) << path;
@@ -189,7 +177,7 @@ TEST_P(Iso9660Oracle, ListingsAndBytesAgree) {
 
   if (!c.sevenZip) return;
   EXPECT_EQ(Fold(ours, plain), Fold(SevenZip(image), plain)) << "7z";
-  ASSERT_TRUE(RunTool("7z x -tiso -y -o" + Quote(tmp.Join("7z")) + " " + Quote(image), &junk));
+  ASSERT_TRUE(RunTool({"7z", "x", "-tiso", "-y", "-o" + tmp.Join("7z"), image}, &junk));
   for (const auto &[path, bytes] : data) {
     std::string extracted = tmp.Join("7z/" + path);
     if (plain) {

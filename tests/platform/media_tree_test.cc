@@ -5,7 +5,6 @@
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 
-#include <cstring>
 #include <filesystem>
 #include <functional>
 #include <string>
@@ -14,6 +13,7 @@
 #include "support/iso_builder.h"
 #include "support/log_capture.h"
 #include "support/udf_builder.h"
+#include "support/udf_walk.h"
 #include "tvx_iso9660.h"
 #include "tvx_udf.h"
 
@@ -110,13 +110,6 @@ TEST(MediaTree, CraftedIsoImagesAreRefusedBeforeWriting) {
   }
 }
 
-Bool ReadVec(void *h, void *buf, size_t len, uint64_t off) {
-  auto *v = static_cast<std::vector<uint8_t> *>(h);
-  if (off > v->size() || len > v->size() - off) return FALSE;
-  std::memcpy(buf, v->data() + off, len);
-  return TRUE;
-}
-
 struct UdfCase {
   const char *name;
   tvxtest::UdfNodeSpec tree;
@@ -160,7 +153,7 @@ TEST(MediaTree, CraftedUdfImagesAreRefusedBeforeWriting) {
     tvxtest::UdfLayout layout;
     std::vector<uint8_t> img = tvxtest::BuildUdf(c.tree, {}, &layout);
     c.patch(&img, layout);
-    UDFVolume *vol = UDF_OpenWithReader(ReadVec, nullptr, &img);
+    UDFVolume *vol = tvxtest::OpenUdfBytes(img);
     ASSERT_NE(vol, nullptr);
     tvxtest::LogCapture log;
     size_t entries = 0;
@@ -176,7 +169,7 @@ TEST(MediaTree, HolesBecomeSparseOutput) {
   tvxtest::UdfNodeSpec root{"", true, "", {{"huge", false, "tail", {}, uint64_t{5} << 30}}};
   tvxtest::UdfLayout layout;
   std::vector<uint8_t> img = tvxtest::BuildUdf(root, {}, &layout);
-  UDFVolume *vol = UDF_OpenWithReader(ReadVec, nullptr, &img);
+  UDFVolume *vol = tvxtest::OpenUdfBytes(img);
   ASSERT_NE(vol, nullptr);
   tvxtest::TempDir tmp;
   ASSERT_EQ(UDF_Extract(vol, "huge", tmp.Path().c_str()), UDF_TREE_OK);

@@ -4,7 +4,6 @@
 // deliver them.
 #include <gtest/gtest.h>
 
-#include <cstring>
 #include <filesystem>
 #include <functional>
 
@@ -19,28 +18,7 @@ using tvxtest::UdfNodeSpec;
 
 namespace {
 
-struct MemImage {
-  std::vector<uint8_t> bytes;
-  int *closes;
-};
-
-Bool ReadMem(void *h, void *buf, size_t len, uint64_t off) {
-  auto *m = static_cast<MemImage *>(h);
-  if (off > m->bytes.size() || len > m->bytes.size() - off) return FALSE;
-  std::memcpy(buf, m->bytes.data() + off, len);
-  return TRUE;
-}
-
-Bool CloseMem(void *h) {
-  auto *m = static_cast<MemImage *>(h);
-  (*m->closes)++;
-  delete m;
-  return TRUE;
-}
-
-UDFVolume *OpenBytes(const std::vector<uint8_t> &img, int *closes) {
-  return UDF_OpenWithReader(ReadMem, CloseMem, new MemImage{img, closes});
-}
+using tvxtest::OpenUdfBytes;
 
 void Expected(const UdfNodeSpec &n, const std::string &path, tvxtest::UdfTree *t) {
   for (const UdfNodeSpec &c : n.children) {
@@ -65,7 +43,7 @@ tvxtest::UdfTree Expected(const UdfNodeSpec &root) {
 int WalkNeverLies(const std::vector<uint8_t> &img, const tvxtest::UdfTree &want, bool *opened) {
   int failures = -1;
   int closes = 0;
-  UDFVolume *vol = OpenBytes(img, &closes);
+  UDFVolume *vol = OpenUdfBytes(img, &closes);
   *opened = vol != nullptr;
   if (vol != nullptr) {
     tvxtest::UdfTree got = tvxtest::WalkUdf(vol);
@@ -97,46 +75,45 @@ size_t At(const UdfLayout &l, uint32_t sector, size_t off = 0) {
   return size_t{sector} * l.blockSize + off;
 }
 
+// Sets a 32-bit field of the descriptor at byte `tag` and reseals it.
+void Patch32(std::vector<uint8_t> *img, size_t tag, size_t off, uint32_t value) {
+  tvxtest::PutLe32(img, tag + off, value);
+  tvxtest::SealTag(img, tag);
+}
+
+// Sets a 32-bit field of a descriptor in both volume descriptor sequences,
+// so that the reserve copy cannot stand in.
+void PatchBothSequences(std::vector<uint8_t> *img, const UdfLayout &l, uint32_t sector,
+                        size_t off, uint32_t value) {
+  for (uint32_t s : {sector, sector + 16}) Patch32(img, At(l, s), off, value);
+}
+
 }  // namespace
 
 TEST(UdfBuilt, ReadsEveryLayout) {
   const UdfNodeSpec tree = tvxtest::SampleUdfTree(50000);
   const tvxtest::UdfTree want = Expected(tree);
-  struct Case {
+  const struct {
     const char *name;
     UdfBuildOptions opt;
+  } cases[] = {
+      {"1.02 short_ad", {}},
+      {"long_ad", {.longAds = true}},
+      {"extended entries", {.extendedEntries = true}},
+      {"2.50 metadata partition", {.metadataPartition = true}},
+      {"embedded data", {.metadataPartition = true, .embedSmallFiles = true}},
+      {"scattered extents", {.extentBlocks = 3, .scatterExtents = true}},
+      {"allocation extent chains",
+       {.metadataPartition = true, .extentBlocks = 1, .scatterExtents = true, .adsPerEntry = 4}},
+      {"512-byte blocks", {.blockSize = 512, .extentBlocks = 7}},
+      {"4096-byte blocks", {.blockSize = 4096, .longAds = true}},
   };
-  std::vector<Case> cases(9);
-  cases[0].name = "1.02 short_ad";
-  cases[1].name = "long_ad";
-  cases[1].opt.longAds = true;
-  cases[2].name = "extended entries";
-  cases[2].opt.extendedEntries = true;
-  cases[3].name = "2.50 metadata partition";
-  cases[3].opt.metadataPartition = true;
-  cases[4].name = "embedded data";
-  cases[4].opt.embedSmallFiles = true;
-  cases[4].opt.metadataPartition = true;
-  cases[5].name = "scattered extents";
-  cases[5].opt.extentBlocks = 3;
-  cases[5].opt.scatterExtents = true;
-  cases[6].name = "allocation extent chains";
-  cases[6].opt.extentBlocks = 1;
-  cases[6].opt.scatterExtents = true;
-  cases[6].opt.adsPerEntry = 4;
-  cases[6].opt.metadataPartition = true;
-  cases[7].name = "512-byte blocks";
-  cases[7].opt.blockSize = 512;
-  cases[7].opt.extentBlocks = 7;
-  cases[8].name = "4096-byte blocks";
-  cases[8].opt.blockSize = 4096;
-  cases[8].opt.longAds = true;
-  for (const Case &c : cases) {
+  for (const auto &c : cases) {
     SCOPED_TRACE(c.name);
     UdfLayout layout;
     std::vector<uint8_t> img = tvxtest::BuildUdf(tree, c.opt, &layout);
     int closes = 0;
-    UDFVolume *vol = OpenBytes(img, &closes);
+    UDFVolume *vol = OpenUdfBytes(img, &closes);
     ASSERT_NE(vol, nullptr);
     char *id = UDF_GetVolumeId(vol);
     EXPECT_STREQ(id, "TVXBUILT");
@@ -153,64 +130,46 @@ TEST(UdfBuilt, ReadsEveryLayout) {
 TEST(UdfHostile, MalformedStructuresFailCleanly) {
   struct Case {
     const char *name;
-    std::function<void(UdfBuildOptions *)> options;
+    UdfBuildOptions opt;
     std::function<void(std::vector<uint8_t> *, const UdfLayout &)> damage;
     int opens;        // 0: fails to open; 1: opens, some entries fail; 2: reads whole
     const char *log;  // a line the reader must log, or ""
   };
   auto flipChecksum = [](std::vector<uint8_t> *img, size_t off) { (*img)[off + 4] ^= 0x55; };
   const Case cases[] = {
-      {"both anchors broken", nullptr,
+      {"both anchors broken", {},
        [&](auto *img, const UdfLayout &l) {
          flipChecksum(img, At(l, 256));
          flipChecksum(img, img->size() - l.blockSize);
        },
        0, ""},
-      {"main sequence broken, reserve used", nullptr,
+      {"main sequence broken, reserve used", {},
        [&](auto *img, const UdfLayout &l) { flipChecksum(img, At(l, l.lvdSector)); }, 2, ""},
-      {"both sequences broken", nullptr,
+      {"both sequences broken", {},
        [&](auto *img, const UdfLayout &l) {
          flipChecksum(img, At(l, l.lvdSector));
          flipChecksum(img, At(l, l.lvdSector + 16));
        },
        0, "UDF: no usable volume descriptor sequence (corrupt structure)\n"},
-      {"logical block size lies", nullptr,
-       [&](auto *img, const UdfLayout &l) {
-         for (uint32_t s : {l.lvdSector, l.lvdSector + 16}) {
-           tvxtest::PutLe32(img, At(l, s, 212), 4096);
-           tvxtest::SealTag(img, At(l, s));
-         }
-       },
+      {"logical block size lies", {},
+       [](auto *img, const UdfLayout &l) { PatchBothSequences(img, l, l.lvdSector, 212, 4096); },
        0, "UDF: logical block size 4096 differs from the sector size 2048\n"},
-      {"partition starts past the end", nullptr,
-       [&](auto *img, const UdfLayout &l) {
-         for (uint32_t s : {l.pdSector, l.pdSector + 16}) {
-           tvxtest::PutLe32(img, At(l, s, 188), 0x100000);
-           tvxtest::SealTag(img, At(l, s));
-         }
-       },
+      {"partition starts past the end", {},
+       [](auto *img, const UdfLayout &l) { PatchBothSequences(img, l, l.pdSector, 188, 0x100000); },
        // Callbacks cannot tell the image size, so this shows at the first read.
        0, "UDF: cannot read the file set descriptor (read error)\n"},
-      {"partition too short for the root", nullptr,
-       [&](auto *img, const UdfLayout &l) {
-         for (uint32_t s : {l.pdSector, l.pdSector + 16}) {
-           tvxtest::PutLe32(img, At(l, s, 192), 2);
-           tvxtest::SealTag(img, At(l, s));
-         }
-       },
+      {"partition too short for the root", {},
+       [](auto *img, const UdfLayout &l) { PatchBothSequences(img, l, l.pdSector, 192, 2); },
        0, "UDF: cannot read the root directory (corrupt structure)\n"},
-      {"partition map table longer than its descriptor", nullptr,
-       [&](auto *img, const UdfLayout &l) {
-         for (uint32_t s : {l.lvdSector, l.lvdSector + 16}) {
-           tvxtest::PutLe32(img, At(l, s, 264), 0xFFFFFF00);
-           tvxtest::SealTag(img, At(l, s));
-         }
+      {"partition map table longer than its descriptor", {},
+       [](auto *img, const UdfLayout &l) {
+         PatchBothSequences(img, l, l.lvdSector, 264, 0xFFFFFF00);
        },
        0, "UDF: partition map table of 4294967040 bytes does not fit its descriptor\n"},
-      {"file set descriptor missing", nullptr,
+      {"file set descriptor missing", {},
        [&](auto *img, const UdfLayout &l) { flipChecksum(img, At(l, l.fsdSector)); }, 0,
        "UDF: cannot read the file set descriptor (corrupt structure)\n"},
-      {"root entry is an indirect entry to itself", nullptr,
+      {"root entry is an indirect entry to itself", {},
        [&](auto *img, const UdfLayout &l) {
          size_t fe = At(l, l.entrySector.at(""));
          tvxtest::PutLe16(img, fe, 259);
@@ -221,52 +180,42 @@ TEST(UdfHostile, MalformedStructuresFailCleanly) {
        },
        0, "UDF: cannot read the root directory (loop)\n"},
       {"metadata file broken, mirror used",
-       [](UdfBuildOptions *o) { o->metadataPartition = true; },
+       {.metadataPartition = true},
        [&](auto *img, const UdfLayout &l) { flipChecksum(img, At(l, l.metadataFileSector)); },
        2, ""},
       {"metadata file and mirror broken",
-       [](UdfBuildOptions *o) { o->metadataPartition = true; },
+       {.metadataPartition = true},
        [&](auto *img, const UdfLayout &l) {
          flipChecksum(img, At(l, l.metadataFileSector));
          flipChecksum(img, At(l, l.metadataFileSector + 1));
        },
        0, "UDF: cannot read the metadata file of partition 0 (corrupt structure)\n"},
-      {"file extent past the end of the image", nullptr,
-       [&](auto *img, const UdfLayout &l) {
-         size_t fe = At(l, l.entrySector.at("big.bin"));
-         tvxtest::PutLe32(img, fe + 176 + 4, 0x7FFFFFF0);
-         tvxtest::SealTag(img, fe);
+      {"file extent past the end of the image", {},
+       [](auto *img, const UdfLayout &l) {
+         Patch32(img, At(l, l.entrySector.at("big.bin")), 176 + 4, 0x7FFFFFF0);
        },
        1, ""},
-      {"size beyond the allocation descriptors", nullptr,
-       [&](auto *img, const UdfLayout &l) {
-         size_t fe = At(l, l.entrySector.at("big.bin"));
-         tvxtest::PutLe32(img, fe + 60, 1);  // 4 GiB more than recorded
-         tvxtest::SealTag(img, fe);
+      {"size beyond the allocation descriptors", {},
+       [](auto *img, const UdfLayout &l) {  // 4 GiB more than recorded
+         Patch32(img, At(l, l.entrySector.at("big.bin")), 60, 1);
        },
        1, ""},
       {"embedded data longer than its entry",
-       [](UdfBuildOptions *o) { o->embedSmallFiles = true; },
-       [&](auto *img, const UdfLayout &l) {
-         size_t fe = At(l, l.entrySector.at("README.TXT"));
-         tvxtest::PutLe32(img, fe + 56, 4000);
-         tvxtest::SealTag(img, fe);
+       {.embedSmallFiles = true},
+       [](auto *img, const UdfLayout &l) {
+         Patch32(img, At(l, l.entrySector.at("README.TXT")), 56, 4000);
        },
        1, ""},
       {"allocation extent chain loops",
-       [](UdfBuildOptions *o) {
-         o->extentBlocks = 1;
-         o->adsPerEntry = 3;
-       },
+       {.extentBlocks = 1, .adsPerEntry = 3},
        [&](auto *img, const UdfLayout &l) {
          // The first AED's continuation (its third descriptor) points back
          // at itself.
          uint32_t aed = l.aedSectors.at("big.bin").at(0);
-         tvxtest::PutLe32(img, At(l, aed, 24 + 2 * 8 + 4), aed - l.partitionStart);
-         tvxtest::SealTag(img, At(l, aed));
+         Patch32(img, At(l, aed), 24 + 2 * 8 + 4, aed - l.partitionStart);
        },
        1, ""},
-      {"file identifier lengths past the directory", nullptr,
+      {"file identifier lengths past the directory", {},
        [&](auto *img, const UdfLayout &l) {
          size_t fid = At(l, l.dirDataSector.at(""), 40);
          tvxtest::PutLe16(img, fid + 36, 0xFFFF);
@@ -278,10 +227,8 @@ TEST(UdfHostile, MalformedStructuresFailCleanly) {
   const tvxtest::UdfTree want = Expected(tree);
   for (const Case &c : cases) {
     SCOPED_TRACE(c.name);
-    UdfBuildOptions opt;
-    if (c.options) c.options(&opt);
     UdfLayout layout;
-    std::vector<uint8_t> img = tvxtest::BuildUdf(tree, opt, &layout);
+    std::vector<uint8_t> img = tvxtest::BuildUdf(tree, c.opt, &layout);
     c.damage(&img, layout);
     tvxtest::LogCapture log;
     bool opened = false;
@@ -306,7 +253,7 @@ TEST(UdfHostile, NamesThatLeaveTheTreeAreHidden) {
   std::vector<uint8_t> img = tvxtest::BuildUdf(root, {}, &layout);
   tvxtest::LogCapture log;
   int closes = 0;
-  UDFVolume *vol = OpenBytes(img, &closes);
+  UDFVolume *vol = OpenUdfBytes(img, &closes);
   ASSERT_NE(vol, nullptr);
   tvxtest::UdfTree got = tvxtest::WalkUdf(vol);
   EXPECT_EQ(got.files.size(), 1u);
@@ -326,12 +273,11 @@ TEST(UdfHostile, DirectoryLoopAndDeepNestingAreBounded) {
   UdfNodeSpec root{"", true, "", {{"loop", true, "", {}}}};
   UdfLayout layout;
   std::vector<uint8_t> img = tvxtest::BuildUdf(root, {}, &layout);
-  size_t fid = At(layout, layout.dirDataSector.at(""), 40);
-  tvxtest::PutLe32(&img, fid + 24, layout.entrySector.at("") - layout.partitionStart);
-  tvxtest::SealTag(&img, fid);
+  Patch32(&img, At(layout, layout.dirDataSector.at(""), 40), 24,
+          layout.entrySector.at("") - layout.partitionStart);
   tvxtest::LogCapture log;
   int closes = 0;
-  UDFVolume *vol = OpenBytes(img, &closes);
+  UDFVolume *vol = OpenUdfBytes(img, &closes);
   ASSERT_NE(vol, nullptr);
   EXPECT_EQ(UDF_OpenDir(vol, nullptr, "loop"), nullptr);
   EXPECT_EQ(UDF_OpenDir(vol, nullptr, "loop/loop/loop"), nullptr);
@@ -347,7 +293,7 @@ TEST(UdfHostile, DirectoryLoopAndDeepNestingAreBounded) {
     path += path.empty() ? "d" : "/d";
   }
   img = tvxtest::BuildUdf(deep, {}, &layout);
-  vol = OpenBytes(img, &closes);
+  vol = OpenUdfBytes(img, &closes);
   ASSERT_NE(vol, nullptr);
   UDFDir *ok = UDF_OpenDir(vol, nullptr, path.substr(0, 2 * 200 - 1).c_str());
   EXPECT_NE(ok, nullptr);

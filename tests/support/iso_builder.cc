@@ -5,12 +5,8 @@
 namespace tvxtest {
 
 std::string Both16(uint16_t v) {
-  std::string s(4, '\0');
-  s[0] = static_cast<char>(v & 0xFF);
-  s[1] = static_cast<char>(v >> 8);
-  s[2] = s[1];
-  s[3] = s[0];
-  return s;
+  char lo = static_cast<char>(v & 0xFF), hi = static_cast<char>(v >> 8);
+  return {lo, hi, hi, lo};
 }
 
 std::string Both32(uint32_t v) {
@@ -47,24 +43,14 @@ std::string Entry(const char *sig, const std::string &data) {
 }  // namespace
 std::string SP() { return Entry("SP", std::string("\xBE\xEF\0", 3)); }
 std::string ER() {
-  std::string id = "RRIP_1991A";
-  std::string data;
-  data += static_cast<char>(id.size());
-  data += '\0';
-  data += '\0';
-  data += '\1';
-  return Entry("ER", data + id);
+  // Identifier length 10, no descriptor or source, extension version 1.
+  return Entry("ER", std::string("\x0A\0\0\1", 4) + "RRIP_1991A");
 }
 std::string NM(const std::string &name, uint8_t flags) {
   return Entry("NM", std::string(1, static_cast<char>(flags)) + name);
 }
 std::string CE(uint32_t block, uint32_t offset, uint32_t length) {
   return Entry("CE", Both32(block) + Both32(offset) + Both32(length));
-}
-std::string CL(uint32_t block) { return Entry("CL", Both32(block)); }
-std::string RE() { return Entry("RE", ""); }
-std::string PX(uint32_t mode) {
-  return Entry("PX", Both32(mode) + Both32(1) + Both32(0) + Both32(0));
 }
 }  // namespace susp
 

@@ -32,9 +32,6 @@ std::string SP();
 std::string ER();  // RRIP_1991A
 std::string NM(const std::string &name, uint8_t flags = 0);
 std::string CE(uint32_t block, uint32_t offset, uint32_t length);
-std::string CL(uint32_t block);
-std::string RE();
-std::string PX(uint32_t mode);
 }  // namespace susp
 
 class IsoBuilder {
@@ -57,7 +54,6 @@ class IsoBuilder {
   void PutBlock(uint32_t block, const std::string &bytes) { Put(uint64_t{block} * 2048, bytes); }
   // Bytes returns the image with the volume space size filled in.
   std::vector<uint8_t> Bytes();
-  std::vector<uint8_t> &Raw() { return image_; }
 
  private:
   std::vector<uint8_t> image_;

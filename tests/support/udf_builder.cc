@@ -19,6 +19,7 @@ uint16_t Crc(const uint8_t *p, size_t n) {
   return crc;
 }
 
+// Standalone (the fuzz seed tool links this file without the library).
 void W16(uint8_t *p, uint16_t v) {
   p[0] = v & 0xFF;
   p[1] = v >> 8;
@@ -156,8 +157,8 @@ class Builder {
       std::memcpy(&img[static_cast<size_t>(kPartitionStart + i) * bs_], phys_.blocks[i].data(),
                   bs_);
     }
-    WriteVds(&img, kMainVds, partLen, metaBase);
-    WriteVds(&img, kReserveVds, partLen, metaBase);
+    WriteVds(&img, kMainVds, partLen);
+    WriteVds(&img, kReserveVds, partLen);
     WriteIntegrity(&img);
     WriteAnchor(&img, 256);
     WriteAnchor(&img, total - 1);
@@ -394,7 +395,7 @@ class Builder {
 
   uint8_t *SectorPtr(std::vector<uint8_t> *img, uint32_t s) { return img->data() + size_t{s} * bs_; }
 
-  void WriteVds(std::vector<uint8_t> *img, uint32_t at, uint32_t partLen, uint32_t metaBase) {
+  void WriteVds(std::vector<uint8_t> *img, uint32_t at, uint32_t partLen) {
     uint8_t *pvd = SectorPtr(img, at);
     W32(pvd + 16, 1);
     Dstring(pvd + 24, 32, opt_.volumeId);
@@ -455,7 +456,6 @@ class Builder {
       mapLen += 64;
       maps++;
     }
-    (void)metaBase;
     W32(lvd + 264, mapLen);
     W32(lvd + 268, maps);
     Tag(lvd, 6, tagVersion_, at + 2, 440 + mapLen);

@@ -1,10 +1,28 @@
 #include "support/udf_walk.h"
 
+#include <cstring>
 #include <vector>
 
 namespace tvxtest {
 
 namespace {
+
+struct MemImage {
+  std::vector<uint8_t> bytes;
+  int *closes;
+};
+Bool ReadMem(void *h, void *buf, size_t len, uint64_t off) {
+  const std::vector<uint8_t> &b = static_cast<MemImage *>(h)->bytes;
+  if (off > b.size() || len > b.size() - off) return FALSE;
+  std::memcpy(buf, b.data() + off, len);
+  return TRUE;
+}
+Bool CloseMem(void *h) {
+  auto *m = static_cast<MemImage *>(h);
+  if (m->closes != nullptr) ++*m->closes;
+  delete m;
+  return TRUE;
+}
 
 void WalkDir(UDFVolume *volume, const std::string &prefix, UdfTree *tree, int depth) {
   UDFDir *dir = UDF_OpenDir(volume, nullptr, prefix.c_str());
@@ -44,6 +62,10 @@ void WalkDir(UDFVolume *volume, const std::string &prefix, UdfTree *tree, int de
 }
 
 }  // namespace
+
+UDFVolume *OpenUdfBytes(const std::vector<uint8_t> &image, int *closes) {
+  return UDF_OpenWithReader(ReadMem, CloseMem, new MemImage{image, closes});
+}
 
 UdfTree WalkUdf(UDFVolume *volume) {
   UdfTree tree;

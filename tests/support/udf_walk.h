@@ -5,6 +5,7 @@
 #include <cstdint>
 #include <map>
 #include <string>
+#include <vector>
 
 #include "tvx_udf.h"
 
@@ -16,6 +17,10 @@ struct UdfTree {
   std::map<std::string, bool> dirs;
   int failures = 0;  // entries that could not be opened or read
 };
+
+// Opens a copy of `image` through UDF_OpenWithReader, as a caller's
+// callbacks would deliver it; `closes` (optional) counts close callbacks.
+UDFVolume *OpenUdfBytes(const std::vector<uint8_t> &image, int *closes = nullptr);
 
 // WalkUdf lists every directory and reads every file below the root.
 UdfTree WalkUdf(UDFVolume *volume);

@@ -119,10 +119,13 @@ TEST_F(ToolsVersionImage, GuestAgainstSignedImageAndAvr) {
     uint32_t status;     // of the evaluation
     const char *logged;  // a line the case must log
   } cases[] = {
-      // vmci is missing, which decides only beside a supported old or new
-      // monolithic version.
-      {"current", Fault::kGood, "monolithic.version = 12.2.0\n", TOOLS_STATUS_CURRENT,
-       "ToolsVersion: missing from the guest  : (  1) vmci\n"},
+      // How the buckets rate each version is the evaluation test's; here the
+      // AVR's maximum and illegal list must arrive from the signed file, and
+      // vmci, missing, decides beside a supported old monolithic version.
+      {"above the AVR maximum", Fault::kGood, "monolithic.version = 13\n", TOOLS_STATUS_TOO_NEW,
+       "ToolsVersion: Status is too new because this is status of monolithic version.\n"},
+      {"blacklisted", Fault::kGood, "monolithic.version = 12.1.1\n", TOOLS_STATUS_BLACKLISTED,
+       "ToolsVersion: Status is blacklisted because this is status of monolithic version.\n"},
       {"older but supported", Fault::kGood, "monolithic.version = 12.1\n",
        TOOLS_STATUS_SUPPORTED_OLD,
        "ToolsVersion: Status is supported old because this is status of monolithic version, and "
