@@ -2,7 +2,7 @@
 // configuration that keeps what the host last learned about the guest tools.
 //
 //   <anyRoot>
-//     <tools-manifest> <monolithic version="12.1.0"/> <vmci version=".." installed="TRUE"/>
+//     <tools-manifest> <monolithic version="12.1.0"/> <netdriver version=".." installed="TRUE"/>
 //     <update-agent-info> <tools> <monolithic guestVersion=".." repoVersion=".." status="3"/>
 //     <tools-install-info> <installError>-1</installError> <updateCounter>3</updateCounter>
 //

@@ -6,7 +6,7 @@ echo "== signature: signed hash data of a tools image"
 pki="$work/pki"
 "$root/scripts/make-test-pki" "$pki"
 mkdir -p "$work/tools-tree"
-printf 'vmtools.version = "12.1.0"\n' >"$work/tools-tree/manifest.txt"
+printf 'guesttools.version = "12.1.0"\n' >"$work/tools-tree/manifest.txt"
 head -c 300000 /dev/zero | tr '\0' 'T' >"$work/tools-tree/payload.bin"
 xorriso -as mkisofs -quiet -V TOOLS -o "$work/linux.iso" "$work/tools-tree" 2>/dev/null
 cat "$pki/signers/maker.pem" "$pki/signers/maker.chain" >"$work/maker.bundle"

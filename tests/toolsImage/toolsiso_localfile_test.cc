@@ -28,9 +28,9 @@ using tvxtest::WriteFileOrDie;
 // Rock Ridge and Joliet names.
 std::string MasterIso(const TempDir &dir, const std::string &name) {
   std::string tree = dir.Join("tree-" + name);
-  std::filesystem::create_directories(tree + "/vmtools");
+  std::filesystem::create_directories(tree + "/guesttools");
   WriteFileOrDie(tree + "/manifest.txt", "tools.version = \"12.1.0\"\n");
-  WriteFileOrDie(tree + "/vmtools/payload.bin", tvxtest::Bytes(150001, 3));
+  WriteFileOrDie(tree + "/guesttools/payload.bin", tvxtest::Bytes(150001, 3));
   std::string iso = dir.Join(name);
   int rc = tvxtest::RunArgv({"xorriso", "-as", "mkisofs", "-quiet", "-R", "-J", "-o", iso, tree});
   EXPECT_EQ(rc, 0);

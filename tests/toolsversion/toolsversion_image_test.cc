@@ -21,7 +21,7 @@ using tvxtest::ReadFileOrDie;
 using tvxtest::WriteFileOrDie;
 
 constexpr const char kHostManifest[] =
-    "monolithic.version = 12.2.0\nvmci.version = 12.2.0\nresult.log = true\n";
+    "monolithic.version = 12.2.0\nnetdriver.version = 12.2.0\nresult.log = true\n";
 constexpr const char kAvr[] =
     "monolithic.version = 12.0.0\nmonolithic.version_max = 12.9\n"
     "monolithic.version_illegal = 12.1.1\n";
@@ -84,7 +84,7 @@ class ToolsVersionImage : public ::testing::Test {
     if (setup == Fault::kNoImage) fs::remove(images + "/linux.iso");
     if (setup == Fault::kTamperedImage) {
       std::string bytes = ReadFileOrDie(images + "/linux.iso");
-      size_t at = bytes.find("vmci.version");
+      size_t at = bytes.find("netdriver.version");
       ASSERT_NE(at, std::string::npos);
       bytes[at] = 'V';
       WriteFileOrDie(images + "/linux.iso", bytes);
@@ -121,7 +121,7 @@ TEST_F(ToolsVersionImage, GuestAgainstSignedImageAndAvr) {
   } cases[] = {
       // How the buckets rate each version is the evaluation test's; here the
       // AVR's maximum and illegal list must arrive from the signed file, and
-      // vmci, missing, decides beside a supported old monolithic version.
+      // netdriver, missing, decides beside a supported old monolithic version.
       {"above the AVR maximum", Fault::kGood, "monolithic.version = 13\n", TOOLS_STATUS_TOO_NEW,
        "ToolsVersion: Status is too new because this is status of monolithic version.\n"},
       {"blacklisted", Fault::kGood, "monolithic.version = 12.1.1\n", TOOLS_STATUS_BLACKLISTED,
@@ -129,7 +129,7 @@ TEST_F(ToolsVersionImage, GuestAgainstSignedImageAndAvr) {
       {"older but supported", Fault::kGood, "monolithic.version = 12.1\n",
        TOOLS_STATUS_SUPPORTED_OLD,
        "ToolsVersion: Status is supported old because this is status of monolithic version, and "
-       "vmci is missing from the guest.\n"},
+       "netdriver is missing from the guest.\n"},
       {"no AVR: the host version is the minimum", Fault::kNoAvr, "monolithic.version = 12.1\n",
        TOOLS_STATUS_TOO_OLD,
        "ToolsVersion: GetHostManifests: Done extracting the manifest file.\n"},
