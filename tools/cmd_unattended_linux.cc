@@ -62,14 +62,6 @@ struct Options {
   LinuxMediaOptions media;
 };
 
-bool ReadFirstLine(const std::string &path, std::string *out) {
-  std::ifstream in(path);
-  if (!in) return false;
-  std::getline(in, *out);
-  if (!out->empty() && out->back() == '\r') out->pop_back();
-  return true;
-}
-
 // Parse fills `o`; returns -1 to go on, else the exit status.
 int Parse(const std::vector<std::string> &args, Options *o) {
   struct Valued {

@@ -3,6 +3,7 @@
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <fstream>
 
 #include "json.h"
 #include "tvx_autoinstall.h"
@@ -112,6 +113,14 @@ std::string CheckAnswer(const GuessResult &guess, const char *label, const std::
   std::free(message);
   if (error == AUTOINSTALL_TEXT_OK) return "";
   return who + " is refused: " + why;
+}
+
+bool ReadFirstLine(const std::string &path, std::string *out) {
+  std::ifstream in(path);
+  if (!in) return false;
+  std::getline(in, *out);
+  if (!out->empty() && out->back() == '\r') out->pop_back();
+  return true;
 }
 
 int ReportAnswers(const AnswerReport &r, bool json) {

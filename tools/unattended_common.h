@@ -37,6 +37,10 @@ enum class AnswerKind { kPassword, kShortName, kName, kOther };
 std::string CheckAnswer(const GuessResult &guess, const char *label, const std::string &text,
                         AnswerKind kind, bool forIni);
 
+// ReadFirstLine reads the first line of a file (a password kept out of the
+// command line), without its line end; false when the file cannot be read.
+bool ReadFirstLine(const std::string &path, std::string *out);
+
 // AnswerReport is what an answer-file command tells at its end.
 struct AnswerReport {
   const char *cmd;               // "unattended linux"
