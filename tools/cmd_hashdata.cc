@@ -11,6 +11,7 @@
 #include "hashdata_writer.h"
 #include "json.h"
 #include "log_lines.h"
+#include "platform/endian.h"
 #include "progress.h"
 #include "tvx_log.h"
 #include "tvx_toolsiso.h"
@@ -64,12 +65,6 @@ std::string CompanionSig(const std::string &path) {
   return path + ".sig";
 }
 
-uint64_t Le(const uint8_t *p, int bytes) {
-  uint64_t v = 0;
-  for (int i = bytes - 1; i >= 0; i--) v = v << 8 | p[i];
-  return v;
-}
-
 int Create(const std::vector<std::string> &args) {
   HashDataOptions options;
   std::string key, cert, sigPath, blockText;
@@ -121,7 +116,8 @@ int Create(const std::vector<std::string> &args) {
   }
   std::printf(
       "%s: %llu hashes of %u-byte blocks, signature %s\n", files[1].c_str(),
-      static_cast<unsigned long long>(Le(reinterpret_cast<const uint8_t *>(out.data()) + 72, 8)),
+      static_cast<unsigned long long>(
+          tvx::LoadLe64(reinterpret_cast<const uint8_t *>(out.data()) + 72)),
       options.blockSize, options.embedSignature ? "embedded" : sigPath.c_str());
   return 0;
 }
@@ -137,8 +133,8 @@ struct BlockReport {
 // gone through again block by block to count and place the bad ones.
 BlockReport CheckBlocks(ToolsIsoHashInfo *info, const std::string &image, bool quiet) {
   const auto *h = static_cast<const uint8_t *>(info->header);
-  uint32_t blockSize = static_cast<uint32_t>(Le(h + 44, 4));
-  uint64_t hashCount = Le(h + 72, 8);
+  uint32_t blockSize = tvx::LoadLe32(h + 44);
+  uint64_t hashCount = tvx::LoadLe64(h + 72);
   BlockReport r;
   FILE *f = std::fopen(image.c_str(), "rb");
   if (f == nullptr) {
@@ -225,7 +221,7 @@ int Check(const std::vector<std::string> &args) {
     return 2;
   }
   const auto *h = static_cast<const uint8_t *>(info->header);
-  uint64_t sigOffset = Le(h + 80, 8), sigSize = Le(h + 88, 8);
+  uint64_t sigOffset = tvx::LoadLe64(h + 80), sigSize = tvx::LoadLe64(h + 88);
   std::string sig;
   bool sigRead = true;
   if (sigOffset != 0) {
@@ -240,7 +236,7 @@ int Check(const std::vector<std::string> &args) {
   std::string sigError = !sigRead ? error : lines.size() > logged ? lines[logged] : "";
   if (!sigError.empty() && sigError.back() == '\n') sigError.pop_back();
   BlockReport r = CheckBlocks(info, files[1], quiet);
-  uint32_t blockSize = static_cast<uint32_t>(Le(h + 44, 4));
+  uint32_t blockSize = tvx::LoadLe32(h + 44);
   ToolsISO_FreeHashInfo(info);
 
   bool good = sigOk && r.bad == 0 && r.problem.empty();

@@ -15,6 +15,7 @@
 #include <cstring>
 #include <vector>
 
+#include "platform/endian.h"
 #include "progress.h"
 
 namespace tvxcli {
@@ -47,10 +48,10 @@ std::string OpensslError(const std::string &what) {
 }
 
 void Le32(std::string *b, size_t at, uint32_t v) {
-  for (int i = 0; i < 4; i++) (*b)[at + i] = static_cast<char>(v >> (8 * i));
+  tvx::StoreLe32(reinterpret_cast<uint8_t *>(b->data() + at), v);
 }
 void Le64(std::string *b, size_t at, uint64_t v) {
-  for (int i = 0; i < 8; i++) (*b)[at + i] = static_cast<char>(v >> (8 * i));
+  tvx::StoreLe64(reinterpret_cast<uint8_t *>(b->data() + at), v);
 }
 
 // Header lays out the fixed fields (tvx_toolsiso.h); the bytes it does not
