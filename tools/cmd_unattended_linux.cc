@@ -171,20 +171,7 @@ int Run(const std::vector<std::string> &args) {
   if (rc >= 0) return rc;
 
   GuessResult guess;
-  int guessRc = RecogniseImage(kName, o.image, &guess);
-  if (guessRc != 0 || guess.guestOS == nullptr) {
-    if (o.json) {
-      std::printf("%s\n", JsonObject()
-                              .Bool("result", false)
-                              .Num("guessResult", guessRc)
-                              .StrOrNull("guestOS", nullptr)
-                              .Text()
-                              .c_str());
-    } else if (guessRc != 2) {
-      std::fprintf(stderr, "tvxguest %s: no guest OS recognised on %s\n", kName, o.image.c_str());
-    }
-    return guessRc == 2 ? 2 : 1;
-  }
+  if (int status = RecogniseForAnswers(kName, o.image, o.json, &guess); status >= 0) return status;
   bool supported = AutoInstall_IsSupportedGuest(&guess);
   if (!supported && !o.json) {
     std::fprintf(stderr, "tvxguest %s: note: unattended install is not offered for %s\n", kName,

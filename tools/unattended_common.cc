@@ -115,6 +115,22 @@ std::string CheckAnswer(const GuessResult &guess, const char *label, const std::
   return who + " is refused: " + why;
 }
 
+int RecogniseForAnswers(const char *cmd, const std::string &image, bool json, GuessResult *out) {
+  int rc = RecogniseImage(cmd, image, out);
+  if (rc == 0 && out->guestOS != nullptr) return -1;
+  if (json) {
+    std::printf("%s\n", JsonObject()
+                            .Bool("result", false)
+                            .Num("guessResult", rc)
+                            .StrOrNull("guestOS", nullptr)
+                            .Text()
+                            .c_str());
+  } else if (rc != 2) {
+    std::fprintf(stderr, "tvxguest %s: no guest OS recognised on %s\n", cmd, image.c_str());
+  }
+  return rc == 2 ? 2 : 1;
+}
+
 bool ReadFirstLine(const std::string &path, std::string *out) {
   std::ifstream in(path);
   if (!in) return false;
