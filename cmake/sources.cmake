@@ -94,6 +94,7 @@ set(TVX_LIBRARY_SOURCES
   platform/util.cc
   platform/version.cc
   platform/vthread.cc
+  platform/xml.cc
 )
 
 set(TVX_TOOL_SOURCES

@@ -1,13 +1,11 @@
-// libcurl is opened with dlopen on first use: linking it costs every process
-// about 10 ms of start-up (its TLS, LDAP and Kerberos dependencies), and most
-// processes never speak HTTP. curl's headers are used for types and option
-// numbers only; every call goes through the table filled by LoadCurl().
+// libcurl is opened on first use (see dynlib.h): linking it costs every
+// process about 10 ms of start-up (its TLS, LDAP and Kerberos dependencies),
+// and most processes never speak HTTP. curl's headers are used for types and
+// option numbers only; every call goes through the table filled by LoadCurl().
 #include "platform/http.h"
 
 #define CURL_DISABLE_TYPECHECK 1  // the calls go through pointers, not the macros
 #include <curl/curl.h>
-
-#include <dlfcn.h>
 
 #include <cinttypes>
 #include <climits>
@@ -19,6 +17,7 @@
 #include <string>
 
 #include "platform/ascii.h"
+#include "platform/dynlib.h"
 
 namespace {
 
@@ -32,28 +31,21 @@ struct CurlApi {
   CURLcode (*easy_getinfo)(CURL *, CURLINFO, ...);
 };
 
-template <typename Fn>
-bool Resolve(void *lib, const char *name, Fn *out) {
-  *out = reinterpret_cast<Fn>(dlsym(lib, name));
-  return *out != nullptr;
-}
-
 // LoadCurl returns the loaded library's entry points, or null when it is
-// missing. The handle is never closed: libcurl keeps global state.
+// missing.
 const CurlApi *LoadCurl() {
   static CurlApi api;
   static bool ok = false;
   static std::once_flag once;
   std::call_once(once, [] {
-    void *lib = dlopen("libcurl.so.4", RTLD_NOW | RTLD_LOCAL);
-    if (lib == nullptr) return;
-    ok = Resolve(lib, "curl_global_init", &api.global_init) &&
-         Resolve(lib, "curl_easy_init", &api.easy_init) &&
-         Resolve(lib, "curl_easy_cleanup", &api.easy_cleanup) &&
-         Resolve(lib, "curl_easy_reset", &api.easy_reset) &&
-         Resolve(lib, "curl_easy_perform", &api.easy_perform) &&
-         Resolve(lib, "curl_easy_setopt", &api.easy_setopt) &&
-         Resolve(lib, "curl_easy_getinfo", &api.easy_getinfo) &&
+    tvx::DynLib lib("libcurl.so.4");
+    ok = lib.Resolve("curl_global_init", &api.global_init) &&
+         lib.Resolve("curl_easy_init", &api.easy_init) &&
+         lib.Resolve("curl_easy_cleanup", &api.easy_cleanup) &&
+         lib.Resolve("curl_easy_reset", &api.easy_reset) &&
+         lib.Resolve("curl_easy_perform", &api.easy_perform) &&
+         lib.Resolve("curl_easy_setopt", &api.easy_setopt) &&
+         lib.Resolve("curl_easy_getinfo", &api.easy_getinfo) &&
          api.global_init(CURL_GLOBAL_DEFAULT) == CURLE_OK;
   });
   return ok ? &api : nullptr;

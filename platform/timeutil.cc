@@ -5,15 +5,17 @@
 #include "platform/timeutil.h"
 
 #include <unicode/ucal.h>
-#include <unicode/ustring.h>
 
 #include <cstdlib>
 #include <cstring>
 #include <fstream>
+#include <mutex>
 #include <string>
 
 #include <climits>
 #include <unistd.h>
+
+#include "platform/dynlib.h"
 
 namespace {
 
@@ -145,19 +147,54 @@ std::string HostZoneId() {
   return std::string();
 }
 
+// ICU's entry points carry its major version in their names
+// (ucal_getDefaultTimeZone_72); its headers' renaming macros spell them.
+#define TVX_NAME_OF(x) #x
+#define TVX_ICU_NAME(x) TVX_NAME_OF(x)
+
+struct IcuApi {
+  decltype(&ucal_getDefaultTimeZone) getDefaultTimeZone;
+  decltype(&ucal_getWindowsTimeZoneID) getWindowsTimeZoneID;
+};
+
+// LoadIcu opens ICU on first use (see dynlib.h): only answer files need a
+// zone name, and linking ICU would slow every process's start-up. Null when
+// it cannot be loaded.
+const IcuApi *LoadIcu() {
+  static IcuApi api;
+  static bool ok = false;
+  static std::once_flag once;
+  std::call_once(once, [] {
+    tvx::DynLib lib("libicui18n.so." TVX_ICU_NAME(U_ICU_VERSION_MAJOR_NUM));
+    ok = lib.Resolve(TVX_ICU_NAME(ucal_getDefaultTimeZone), &api.getDefaultTimeZone) &&
+         lib.Resolve(TVX_ICU_NAME(ucal_getWindowsTimeZoneID), &api.getWindowsTimeZoneID);
+  });
+  return ok ? &api : nullptr;
+}
+
+// Zone identifiers, in both ICU's and the tz database's spelling, are ASCII;
+// anything else is no zone either knows.
+bool AsciiFromUChars(const UChar *in, int32_t len, char *out) {
+  for (int32_t i = 0; i < len; ++i) {
+    if (in[i] == 0 || in[i] > 0x7E) return false;
+    out[i] = static_cast<char>(in[i]);
+  }
+  out[len] = '\0';
+  return true;
+}
+
 // IcuDefaultZoneId asks ICU, which has its own ways of finding the host zone.
 std::string IcuDefaultZoneId() {
+  const IcuApi *icu = LoadIcu();
+  if (icu == nullptr) return std::string();
   UChar buf[128];
   UErrorCode status = U_ZERO_ERROR;
-  int32_t len = ucal_getDefaultTimeZone(buf, 128, &status);
-  if (U_FAILURE(status) || len <= 0 || len >= 128) return std::string();
-  char out[128 * 3 + 1];
-  int32_t outLen = 0;
-  u_strToUTF8(out, sizeof out, &outLen, buf, len, &status);
-  if (U_FAILURE(status) || outLen <= 0 || outLen >= static_cast<int32_t>(sizeof out)) {
+  int32_t len = icu->getDefaultTimeZone(buf, 128, &status);
+  char out[128];
+  if (U_FAILURE(status) || len <= 0 || len >= 128 || !AsciiFromUChars(buf, len, out)) {
     return std::string();
   }
-  return std::string(out, static_cast<size_t>(outLen));
+  return std::string(out);
 }
 
 }  // namespace
@@ -173,23 +210,24 @@ int TimeUtil_WindowsZoneIndex(const char *windowsName) {
 int TimeUtil_WindowsZoneForId(const char *zoneId, char **out_name) {
   if (out_name != nullptr) *out_name = nullptr;
   if (zoneId == nullptr || *zoneId == '\0') return -1;
+  const IcuApi *icu = LoadIcu();
+  if (icu == nullptr) return -1;
   UChar id[128];
-  UErrorCode status = U_ZERO_ERROR;
   int32_t idLen = 0;
-  u_strFromUTF8(id, 128, &idLen, zoneId, -1, &status);
-  if (U_FAILURE(status) || idLen <= 0 || idLen >= 128) return -1;
+  for (; zoneId[idLen] != '\0'; ++idLen) {
+    auto c = static_cast<unsigned char>(zoneId[idLen]);
+    if (idLen == 127 || c > 0x7E) return -1;
+    id[idLen] = c;
+  }
 
   UChar win[128];
-  status = U_ZERO_ERROR;
-  int32_t winLen = ucal_getWindowsTimeZoneID(id, idLen, win, 128, &status);
-  if (U_FAILURE(status) || winLen <= 0 || winLen >= 128) return -1;
+  UErrorCode status = U_ZERO_ERROR;
+  int32_t winLen = icu->getWindowsTimeZoneID(id, idLen, win, 128, &status);
   // CLDR's Windows names are plain ASCII.
   char name[128];
-  for (int32_t i = 0; i < winLen; ++i) {
-    if (win[i] == 0 || win[i] > 0x7E) return -1;
-    name[i] = static_cast<char>(win[i]);
+  if (U_FAILURE(status) || winLen <= 0 || winLen >= 128 || !AsciiFromUChars(win, winLen, name)) {
+    return -1;
   }
-  name[winLen] = '\0';
   if (out_name != nullptr) {
     *out_name = strdup(name);
     if (*out_name == nullptr) return -1;

@@ -1,23 +1,19 @@
-// Owners for libxml2 objects (see unique.h for the pattern).
+// Owners for libxml2 objects (see unique.h for the pattern). They release
+// through the loaded library: an object exists only once LoadXml succeeded.
 #pragma once
 
-#include <libxml/tree.h>
-#include <libxml/xpath.h>
-#include <libxml/xmlwriter.h>
-
 #include "platform/unique.h"
+#include "platform/xml.h"
 
 namespace tvx {
 
-TVX_MAKE_DELETER(xmlDoc, xmlFreeDoc);
-TVX_MAKE_DELETER(xmlXPathContext, xmlXPathFreeContext);
-TVX_MAKE_DELETER(xmlXPathObject, xmlXPathFreeObject);
-TVX_MAKE_DELETER(xmlBuffer, xmlBufferFree);
-TVX_MAKE_DELETER(xmlTextWriter, xmlFreeTextWriter);
+TVX_MAKE_DELETER(xmlDoc, Xml().xmlFreeDoc);
+TVX_MAKE_DELETER(xmlXPathContext, Xml().xmlXPathFreeContext);
+TVX_MAKE_DELETER(xmlXPathObject, Xml().xmlXPathFreeObject);
 
 // XmlChars owns a string that libxml2 allocated (xmlFree).
 struct XmlCharsDeleter {
-  void operator()(xmlChar *p) const noexcept { xmlFree(p); }
+  void operator()(xmlChar *p) const noexcept { (*Xml().xmlFree)(p); }
 };
 using XmlChars = std::unique_ptr<xmlChar, XmlCharsDeleter>;
 

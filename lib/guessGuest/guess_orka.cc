@@ -4,8 +4,6 @@
 //   <iso_build><product><name>Tarvex Orka Server</name>
 //              <orka_version>4.1.0</orka_version>...</product>...</iso_build>
 // Orkai media are told apart by the title of their isolinux boot menu.
-#include <libxml/parser.h>
-#include <libxml/tree.h>
 
 #include <climits>
 #include <cstring>
@@ -23,7 +21,7 @@ using tvx::guess::Contains;
 using tvx::guess::Text;
 
 bool Named(const xmlNode *node, const char *name) {
-  return xmlStrEqual(node->name, reinterpret_cast<const xmlChar *>(name)) != 0;
+  return tvx::Xml().xmlStrEqual(node->name, reinterpret_cast<const xmlChar *>(name)) != 0;
 }
 
 // The text of <name> or <orka_version>: an element whose first child is not
@@ -39,10 +37,12 @@ bool IsOrkaBuild(const char *text) {
   if (length > INT_MAX) return false;
   // The file comes from an untrusted image: no network, no external DTD, no
   // entity substitution, and no messages on the host's standard error.
-  tvx::UniquePtr<xmlDoc> doc(xmlReadMemory(text, static_cast<int>(length), "packages.xml", nullptr,
+  const tvx::XmlApi *xml = tvx::LoadXml();
+  if (xml == nullptr) return false;
+  tvx::UniquePtr<xmlDoc> doc(xml->xmlReadMemory(text, static_cast<int>(length), "packages.xml", nullptr,
                                  XML_PARSE_NONET | XML_PARSE_NOERROR | XML_PARSE_NOWARNING));
   if (!doc) return false;
-  const xmlNode *root = xmlDocGetRootElement(doc.get());
+  const xmlNode *root = xml->xmlDocGetRootElement(doc.get());
   if (root == nullptr || !Named(root, "iso_build")) return false;
   const xmlNode *product = root->children;
   while (product != nullptr && !Named(product, "product")) product = product->next;

@@ -3,7 +3,6 @@
 // a host may ship a reduced template for a guest family.
 #include "lib/guestInstall/autoinstall_windows_xml.h"
 
-#include <libxml/parser.h>
 
 #include <cstring>
 
@@ -178,11 +177,12 @@ Bool AutoInstallEditUnattendXml(const char *xmlPath, const char *productKey,
     if (!AutoInstallXmlTextIsValid(text)) return FALSE;
   }
 
-  xmlInitParser();
+  const tvx::XmlApi *xml = tvx::LoadXml();
+  if (xml == nullptr) return FALSE;
   // Templates are local files: no network access, entities left as references
   // rather than expanded, and no parser chatter on the host's standard error.
   tvx::UniquePtr<xmlDoc> doc(
-      xmlReadFile(xmlPath, nullptr, XML_PARSE_NONET | XML_PARSE_NOERROR | XML_PARSE_NOWARNING));
+      xml->xmlReadFile(xmlPath, nullptr, XML_PARSE_NONET | XML_PARSE_NOERROR | XML_PARSE_NOWARNING));
   if (doc == nullptr) return FALSE;
   tvx::UniquePtr<xmlXPathContext> ctx(AutoInstallXmlNewContext(doc.get()));
   if (ctx == nullptr) return FALSE;
@@ -195,7 +195,7 @@ Bool AutoInstallEditUnattendXml(const char *xmlPath, const char *productKey,
   // written through whatever link its name might be.
   xmlChar *text = nullptr;
   int size = 0;
-  xmlDocDumpMemory(doc.get(), &text, &size);
+  xml->xmlDocDumpMemory(doc.get(), &text, &size);
   tvx::XmlChars owned(text);
   if (text == nullptr || size < 0) return FALSE;
   FileReplaceOptions options;

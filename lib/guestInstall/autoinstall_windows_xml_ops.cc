@@ -28,7 +28,7 @@ const xmlChar *X(const char *s) { return reinterpret_cast<const xmlChar *>(s); }
 // yields no node or is not a node set.
 tvx::UniquePtr<xmlXPathObject> Eval(xmlXPathContext *ctx, const char *expr) {
   if (ctx == nullptr || expr == nullptr) return nullptr;
-  tvx::UniquePtr<xmlXPathObject> obj(xmlXPathEvalExpression(X(expr), ctx));
+  tvx::UniquePtr<xmlXPathObject> obj(tvx::Xml().xmlXPathEvalExpression(X(expr), ctx));
   if (obj == nullptr || obj->type != XPATH_NODESET || xmlXPathNodeSetIsEmpty(obj->nodesetval)) {
     return nullptr;
   }
@@ -58,7 +58,7 @@ bool IsXmlChar(int32_t c) {
 }
 
 bool IsBlankText(const xmlNode *node) {
-  return node != nullptr && node->type == XML_TEXT_NODE && xmlIsBlankNode(const_cast<xmlNode *>(node));
+  return node != nullptr && node->type == XML_TEXT_NODE && tvx::Xml().xmlIsBlankNode(const_cast<xmlNode *>(node));
 }
 
 // StillInDocument tells whether `node` still hangs below the document node,
@@ -78,22 +78,22 @@ void Append(xmlNode *parent, xmlNode *elder, xmlNode *child) {
   xmlNode *indent = elder->prev;
   if (IsBlankText(closing) && closing != indent && IsBlankText(indent)) {
     // Adding the indentation next to the closing text would merge the two.
-    xmlAddPrevSibling(closing, child);
-    xmlNode *copy = xmlNewText(indent->content);
-    if (copy != nullptr) xmlAddPrevSibling(child, copy);
+    tvx::Xml().xmlAddPrevSibling(closing, child);
+    xmlNode *copy = tvx::Xml().xmlNewText(indent->content);
+    if (copy != nullptr) tvx::Xml().xmlAddPrevSibling(child, copy);
     return;
   }
-  xmlAddChild(parent, child);
+  tvx::Xml().xmlAddChild(parent, child);
 }
 
 }  // namespace
 
 xmlXPathContext *AutoInstallXmlNewContext(xmlDoc *doc) {
   if (doc == nullptr) return nullptr;
-  xmlXPathContext *ctx = xmlXPathNewContext(doc);
+  xmlXPathContext *ctx = tvx::Xml().xmlXPathNewContext(doc);
   if (ctx == nullptr) return nullptr;
-  if (xmlXPathRegisterNs(ctx, X("urn"), X(AUTOINSTALL_UNATTEND_NS)) != 0) {
-    xmlXPathFreeContext(ctx);
+  if (tvx::Xml().xmlXPathRegisterNs(ctx, X("urn"), X(AUTOINSTALL_UNATTEND_NS)) != 0) {
+    tvx::Xml().xmlXPathFreeContext(ctx);
     return nullptr;
   }
   return ctx;
@@ -117,9 +117,9 @@ Bool AutoInstallXmlSetText(xmlXPathContext *ctx, const char *expr, const char *t
   if (obj == nullptr) return FALSE;
   // xmlNodeSetContent reads entity and character references in its argument,
   // so the text is escaped first to arrive verbatim.
-  tvx::XmlChars escaped(xmlEncodeEntitiesReentrant(nullptr, X(text)));
+  tvx::XmlChars escaped(tvx::Xml().xmlEncodeEntitiesReentrant(nullptr, X(text)));
   if (escaped == nullptr) return FALSE;
-  xmlNodeSetContent(obj->nodesetval->nodeTab[0], escaped.get());
+  tvx::Xml().xmlNodeSetContent(obj->nodesetval->nodeTab[0], escaped.get());
   return TRUE;
 }
 
@@ -133,10 +133,10 @@ Bool AutoInstallXmlRemoveNodes(xmlXPathContext *ctx, const char *expr) {
   for (int i = 0; i < set->nodeNr; ++i) {
     xmlNode *node = set->nodeTab[i];
     if (node->type == XML_NAMESPACE_DECL || !StillInDocument(node)) continue;
-    xmlUnlinkNode(node);
+    tvx::Xml().xmlUnlinkNode(node);
     removed.push_back(node);
   }
-  for (xmlNode *node : removed) xmlFreeNode(node);
+  for (xmlNode *node : removed) tvx::Xml().xmlFreeNode(node);
   return TRUE;
 }
 
@@ -145,7 +145,7 @@ Bool AutoInstallXmlSetAmd64(xmlXPathContext *ctx, const char *expr) {
   if (obj == nullptr) return FALSE;
   xmlNode *node = obj->nodesetval->nodeTab[0];
   if (node->type != XML_ELEMENT_NODE) return FALSE;
-  return xmlSetProp(node, X("processorArchitecture"), X("amd64")) != nullptr;
+  return tvx::Xml().xmlSetProp(node, X("processorArchitecture"), X("amd64")) != nullptr;
 }
 
 Bool AutoInstallXmlAddFirstLogonCommand(xmlDoc *doc, const char *commandLine) {
@@ -162,7 +162,7 @@ Bool AutoInstallXmlAddFirstLogonCommand(xmlDoc *doc, const char *commandLine) {
     return FALSE;
   }
 
-  tvx::XmlChars text(xmlNodeGetContent(lastOrder));
+  tvx::XmlChars text(tvx::Xml().xmlNodeGetContent(lastOrder));
   const char *digits = text != nullptr ? reinterpret_cast<const char *>(text.get()) : "";
   errno = 0;
   long last = std::strtol(digits, nullptr, 10);
@@ -174,14 +174,14 @@ Bool AutoInstallXmlAddFirstLogonCommand(xmlDoc *doc, const char *commandLine) {
   if (Str_Snprintf(order, sizeof order, "%d", static_cast<int>(last + 1)) < 0) return FALSE;
 
   xmlNs *ns = commands->ns;
-  xmlNode *node = xmlNewNode(ns, X("SynchronousCommand"));
+  xmlNode *node = tvx::Xml().xmlNewNode(ns, X("SynchronousCommand"));
   if (node == nullptr) return FALSE;
-  xmlNs *wcm = xmlSearchNsByHref(doc, commands, X(kWcmNamespace));
-  if (wcm == nullptr || wcm->prefix == nullptr) wcm = xmlNewNs(node, X(kWcmNamespace), X("wcm"));
-  if (wcm == nullptr || xmlNewNsProp(node, wcm, X("action"), X("add")) == nullptr ||
-      xmlNewTextChild(node, ns, X("CommandLine"), X(commandLine)) == nullptr ||
-      xmlNewTextChild(node, ns, X("Order"), X(order)) == nullptr) {
-    xmlFreeNode(node);
+  xmlNs *wcm = tvx::Xml().xmlSearchNsByHref(doc, commands, X(kWcmNamespace));
+  if (wcm == nullptr || wcm->prefix == nullptr) wcm = tvx::Xml().xmlNewNs(node, X(kWcmNamespace), X("wcm"));
+  if (wcm == nullptr || tvx::Xml().xmlNewNsProp(node, wcm, X("action"), X("add")) == nullptr ||
+      tvx::Xml().xmlNewTextChild(node, ns, X("CommandLine"), X(commandLine)) == nullptr ||
+      tvx::Xml().xmlNewTextChild(node, ns, X("Order"), X(order)) == nullptr) {
+    tvx::Xml().xmlFreeNode(node);
     return FALSE;
   }
   Append(commands, command, node);

@@ -133,9 +133,6 @@ uint32_t GetStatus(const char *configPath, Dictionary *config, const char *guest
 std::string ExtendedConfigPath(const char *configPath, const Dictionary *config);
 // ReadExtendedConfig reads the whole file; false (logged) on failure.
 bool ReadExtendedConfig(const std::string &path, std::string *out);
-// XmlStartOnce runs libxml2's version check the first time XML is parsed in
-// the process.
-void XmlStartOnce();
 struct SavedGuestInfo {
   uint32_t status = TOOLS_STATUS_UNKNOWN;  // a saved status other than 0 and 9
   DictPtr manifest;                        // else the saved manifest, if any

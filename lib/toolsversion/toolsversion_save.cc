@@ -2,8 +2,6 @@
 // extended config file and rewrites it whole. The document is edited in
 // memory; the file changes only at the very end, through the crash-safe
 // replace, so any failure before or during the write leaves it as it was.
-#include <libxml/parser.h>
-#include <libxml/tree.h>
 
 #include <cerrno>
 #include <cstring>
@@ -26,12 +24,12 @@ bool IsEmpty(const char *text) { return text == nullptr || text[0] == '\0'; }
 
 void RemoveNode(xmlNode *node) {
   if (node == nullptr) return;
-  xmlUnlinkNode(node);
-  xmlFreeNode(node);
+  tvx::Xml().xmlUnlinkNode(node);
+  tvx::Xml().xmlFreeNode(node);
 }
 
 xmlNode *Append(xmlNode *parent, const xmlChar *name) {
-  return xmlNewChild(parent, nullptr, name, nullptr);
+  return tvx::Xml().xmlNewChild(parent, nullptr, name, nullptr);
 }
 
 // A text the document can carry and give back: valid UTF-8 without the
@@ -39,7 +37,7 @@ xmlNode *Append(xmlNode *parent, const xmlChar *name) {
 // trusted to hold only such text, and one bad byte written out would make
 // the whole file unreadable.
 bool IsXmlText(const std::string &text) {
-  if (xmlCheckUTF8(X(text.c_str())) == 0) return false;
+  if (tvx::Xml().xmlCheckUTF8(X(text.c_str())) == 0) return false;
   for (char c : text) {
     if (ascii::IsControl(c) && c != '\t' && c != '\n' && c != '\r') return false;
   }
@@ -57,7 +55,7 @@ bool ApplyAgentReport(xmlNode *root, const char *agentXml, xmlNode **agentInfo,
   }
   RemoveNode(*agentInfo);
   *agentInfo = Append(root, X("update-agent-info"));
-  xmlNode *agentRoot = xmlDocGetRootElement(agent.get());
+  xmlNode *agentRoot = tvx::Xml().xmlDocGetRootElement(agent.get());
   if (agentRoot == nullptr) {
     TV_LOG("Failed to find root in update agent xml.\n");
     return false;
@@ -70,7 +68,7 @@ bool ApplyAgentReport(xmlNode *root, const char *agentXml, xmlNode **agentInfo,
       if (c->type != XML_ELEMENT_NODE) continue;
       xmlNode *component = Append(group, c->name);
       for (const char *attr : {"guestVersion", "repoVersion", "status"}) {
-        if (auto value = Attribute(c, attr)) xmlSetProp(component, X(attr), X(value->c_str()));
+        if (auto value = Attribute(c, attr)) tvx::Xml().xmlSetProp(component, X(attr), X(value->c_str()));
       }
       if (NameIs(g, "tools") && NameIs(c, "monolithic")) {
         if (auto v = Attribute(c, "guestVersion")) monoVersion = v;
@@ -82,7 +80,7 @@ bool ApplyAgentReport(xmlNode *root, const char *agentXml, xmlNode **agentInfo,
   if (monoVersion) {
     *manifest = Append(root, X("tools-manifest"));
     xmlNode *mono = Append(*manifest, X("monolithic"));
-    xmlSetProp(mono, X("version"), X(monoVersion->c_str()));
+    tvx::Xml().xmlSetProp(mono, X("version"), X(monoVersion->c_str()));
   }
   return true;
 }
@@ -104,7 +102,7 @@ Bool AddManifestEntry(const char *name, const char *value, void *ctx) {
   std::string component = dot != nullptr ? std::string(name, dot) : std::string(name);
   std::string suffix = dot != nullptr ? std::string(dot + 1) : std::string();
   if (dot != nullptr && ascii::Equal(suffix, "encoding")) return TRUE;
-  if (!IsXmlText(component) || xmlValidateName(X(component.c_str()), 0) != 0 ||
+  if (!IsXmlText(component) || tvx::Xml().xmlValidateName(X(component.c_str()), 0) != 0 ||
       !IsXmlText(value)) {
     TV_LOG("Skipping manifest entry '%s': not representable in XML.\n", name);
     return TRUE;
@@ -112,7 +110,7 @@ Bool AddManifestEntry(const char *name, const char *value, void *ctx) {
   xmlNode *node = FindOrAppendExact(walk->manifest, component);
   if (dot == nullptr) return TRUE;
   for (const char *attr : {"version", "installed"}) {
-    if (ascii::Equal(suffix, attr)) xmlSetProp(node, X(attr), X(value));
+    if (ascii::Equal(suffix, attr)) tvx::Xml().xmlSetProp(node, X(attr), X(value));
   }
   return TRUE;
 }
@@ -140,13 +138,13 @@ void SetNumber(xmlNode *parent, const char *name, int32_t value) {
   if (node == nullptr) node = Append(parent, X(name));
   char text[16];
   Str_Snprintf(text, sizeof text, "%d", value);
-  xmlNodeSetContent(node, X(text));
+  tvx::Xml().xmlNodeSetContent(node, X(text));
 }
 
 bool WriteDocument(xmlDoc *doc, const std::string &path) {
   xmlChar *raw = nullptr;
   int size = 0;
-  xmlDocDumpMemory(doc, &raw, &size);
+  tvx::Xml().xmlDocDumpMemory(doc, &raw, &size);
   XmlChars out(raw);
   if (out == nullptr || size <= 0) {
     TV_LOG("Error dumping xml doc to the output buffer.\n");

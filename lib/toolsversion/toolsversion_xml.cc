@@ -10,8 +10,6 @@
 // or a guest manifest; toolsversion_save.cc merges new reports into it.
 #include "lib/toolsversion/toolsversion_xml.h"
 
-#include <libxml/parser.h>
-#include <libxml/xmlversion.h>
 
 #include <atomic>
 #include <cstring>
@@ -25,16 +23,11 @@ namespace tvx::toolsversion {
 // Config files larger than this are refused as not being config files.
 constexpr uint64_t kMaxExtendedConfigSize = 2147483647;
 
-void XmlStartOnce() {
-  static std::atomic<bool> checked{false};
-  if (!checked.exchange(true)) xmlCheckVersion(LIBXML_VERSION);
-}
-
 UniquePtr<xmlDoc> ParseXml(const char *text, size_t length) {
-  XmlStartOnce();
-  if (length > static_cast<size_t>(INT32_MAX)) return nullptr;
+  const XmlApi *xml = LoadXml();
+  if (xml == nullptr || length > static_cast<size_t>(INT32_MAX)) return nullptr;
   return UniquePtr<xmlDoc>(
-      xmlReadMemory(text, static_cast<int>(length), nullptr, nullptr,
+      xml->xmlReadMemory(text, static_cast<int>(length), nullptr, nullptr,
                     XML_PARSE_NONET | XML_PARSE_NOERROR | XML_PARSE_NOWARNING));
 }
 
@@ -66,7 +59,7 @@ xmlNode *LastChildNamed(const xmlNode *parent, const char *name) {
 }
 
 std::optional<std::string> Attribute(const xmlNode *node, const char *name) {
-  XmlChars value(xmlGetProp(node, reinterpret_cast<const xmlChar *>(name)));
+  XmlChars value(tvx::Xml().xmlGetProp(node, reinterpret_cast<const xmlChar *>(name)));
   if (value == nullptr) return std::nullopt;
   return std::string(reinterpret_cast<const char *>(value.get()));
 }
@@ -119,7 +112,7 @@ UniquePtr<xmlDoc> LoadExtendedConfig(const std::string &path, xmlNode **out_root
     TV_LOG("Error parsing xml from extended config file.\n");
     return nullptr;
   }
-  *out_root = xmlDocGetRootElement(doc.get());
+  *out_root = tvx::Xml().xmlDocGetRootElement(doc.get());
   if (*out_root == nullptr) {
     TV_LOG("Failed to find root in extended config xml.\n");
     return nullptr;
