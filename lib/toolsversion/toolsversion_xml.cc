@@ -11,7 +11,6 @@
 #include "lib/toolsversion/toolsversion_xml.h"
 
 
-#include <atomic>
 #include <cstring>
 
 #include "platform/ascii.h"
