@@ -7,8 +7,17 @@ namespace tvxtest {
 
 namespace {
 
-constexpr uint32_t kPartitionStart = 300;
-constexpr uint32_t kMainVds = 260, kReserveVds = 276, kIntegrity = 292;
+// Where the volume structures go: after the anchor at sector 256, or, for a
+// compact image, between the recognition sequence and that anchor, which is
+// then the image's last sector.
+struct Places {
+  uint32_t mainVds, reserveVds, integrity, partitionStart;
+};
+Places PlacesFor(const UdfBuildOptions &o) {
+  if (!o.compact) return {260, 276, 292, 300};
+  uint32_t first = (32768 + 3 * 2048 + o.blockSize - 1) / o.blockSize;
+  return {first, first + 16, first + 32, first + 34};
+}
 
 uint16_t Crc(const uint8_t *p, size_t n) {
   uint16_t crc = 0;
@@ -88,8 +97,8 @@ std::string Cs0(const std::string &utf8) {
       out.push_back(static_cast<char>(c));
     } else if (c >= 0x10000) {
       char32_t v = c - 0x10000, hi = 0xD800 + (v >> 10), lo = 0xDC00 + (v & 0x3FF);
-      out += {static_cast<char>(hi >> 8), static_cast<char>(hi & 0xFF),
-              static_cast<char>(lo >> 8), static_cast<char>(lo & 0xFF)};
+      out += {static_cast<char>(hi >> 8), static_cast<char>(hi & 0xFF), static_cast<char>(lo >> 8),
+              static_cast<char>(lo & 0xFF)};
     } else {
       out += {static_cast<char>(c >> 8), static_cast<char>(c & 0xFF)};
     }
@@ -124,7 +133,7 @@ struct Space {
 
 class Builder {
  public:
-  explicit Builder(const UdfBuildOptions &o) : opt_(o), bs_(o.blockSize) {
+  explicit Builder(const UdfBuildOptions &o) : opt_(o), bs_(o.blockSize), at_(PlacesFor(o)) {
     phys_.bs = meta_.bs = bs_;
     rev_ = opt_.metadataPartition ? 0x0250 : opt_.extendedEntries ? 0x0201 : 0x0102;
     tagVersion_ = rev_ >= 0x0200 ? 3 : 2;
@@ -150,27 +159,32 @@ class Builder {
       }
     }
     uint32_t partLen = static_cast<uint32_t>(phys_.blocks.size());
-    uint32_t total = kPartitionStart + partLen + 1;
+    uint32_t total = at_.partitionStart + partLen + 1;
+    if (opt_.compact) {
+      if (total > 257) throw std::runtime_error("tree too large for a compact image");
+      total = 257;
+    }
     std::vector<uint8_t> img(static_cast<size_t>(total) * bs_, 0);
     WriteVrs(&img);
     for (uint32_t i = 0; i < partLen; i++) {
-      std::memcpy(&img[static_cast<size_t>(kPartitionStart + i) * bs_], phys_.blocks[i].data(),
+      std::memcpy(&img[static_cast<size_t>(at_.partitionStart + i) * bs_], phys_.blocks[i].data(),
                   bs_);
     }
-    WriteVds(&img, kMainVds, partLen);
-    WriteVds(&img, kReserveVds, partLen);
+    WriteVds(&img, at_.mainVds, partLen);
+    WriteVds(&img, at_.reserveVds, partLen);
     WriteIntegrity(&img);
     WriteAnchor(&img, 256);
-    WriteAnchor(&img, total - 1);
+    if (total - 1 != 256) WriteAnchor(&img, total - 1);
 
     layout->blockSize = bs_;
-    layout->partitionStart = kPartitionStart;
-    layout->metadataStart = kPartitionStart + metaBase;
-    layout->vdsSectors = {kMainVds, kMainVds + 1, kMainVds + 2, kMainVds + 3, kMainVds + 4};
-    layout->pdSector = kMainVds + 1;
-    layout->lvdSector = kMainVds + 2;
+    layout->partitionStart = at_.partitionStart;
+    layout->metadataStart = at_.partitionStart + metaBase;
+    layout->vdsSectors = {at_.mainVds, at_.mainVds + 1, at_.mainVds + 2, at_.mainVds + 3,
+                          at_.mainVds + 4};
+    layout->pdSector = at_.mainVds + 1;
+    layout->lvdSector = at_.mainVds + 2;
     layout->fsdSector = Sector(0);
-    layout->metadataFileSector = kPartitionStart;
+    layout->metadataFileSector = at_.partitionStart;
     for (auto &[path, lbn] : entries_) layout->entrySector[path] = Sector(lbn);
     for (auto &[path, lbn] : dirData_) layout->dirDataSector[path] = Sector(lbn);
     for (auto &[path, v] : aeds_) {
@@ -186,9 +200,10 @@ class Builder {
   size_t EntryBase() const { return Efe() ? 216 : 176; }
   // Only valid after the metadata blocks were appended to the partition.
   uint32_t Sector(uint32_t icbLbn) const {
-    return kPartitionStart + icbLbn +
-           (opt_.metadataPartition ? static_cast<uint32_t>(phys_.blocks.size() - meta_.blocks.size())
-                                   : 0);
+    return at_.partitionStart + icbLbn +
+           (opt_.metadataPartition
+                ? static_cast<uint32_t>(phys_.blocks.size() - meta_.blocks.size())
+                : 0);
   }
 
   void BuildNode(const UdfNodeSpec &n, const std::string &path, uint32_t self, uint32_t parent) {
@@ -251,7 +266,8 @@ class Builder {
     }
     for (uint32_t b = 0; b < blocks; b++) {
       size_t off = size_t{b} * bs_;
-      std::memcpy(Icb().At(dataLbn + b), sealed.data() + off, std::min<size_t>(bs_, sealed.size() - off));
+      std::memcpy(Icb().At(dataLbn + b), sealed.data() + off,
+                  std::min<size_t>(bs_, sealed.size() - off));
     }
     bool longAd = opt_.longAds;
     ads = EncodeAds({{static_cast<uint32_t>(sealed.size()), 0, dataLbn, IcbPart()}}, longAd, path);
@@ -393,7 +409,9 @@ class Builder {
     }
   }
 
-  uint8_t *SectorPtr(std::vector<uint8_t> *img, uint32_t s) { return img->data() + size_t{s} * bs_; }
+  uint8_t *SectorPtr(std::vector<uint8_t> *img, uint32_t s) {
+    return img->data() + size_t{s} * bs_;
+  }
 
   void WriteVds(std::vector<uint8_t> *img, uint32_t at, uint32_t partLen) {
     uint8_t *pvd = SectorPtr(img, at);
@@ -418,7 +436,7 @@ class Builder {
     W16(pd + 22, 0);
     Regid(pd + 24, rev_ >= 0x0200 ? "+NSR03" : "+NSR02");
     W32(pd + 184, 1);
-    W32(pd + 188, kPartitionStart);
+    W32(pd + 188, at_.partitionStart);
     W32(pd + 192, partLen);
     Regid(pd + 196, "*tvx builder");
     Tag(pd, 5, tagVersion_, at + 1, 512);
@@ -434,7 +452,7 @@ class Builder {
     W16(lvd + 256, IcbPart());
     Regid(lvd + 272, "*tvx builder");
     W32(lvd + 432, 2 * bs_);
-    W32(lvd + 436, kIntegrity);
+    W32(lvd + 436, at_.integrity);
     uint8_t *m = lvd + 440;
     m[0] = 1;
     m[1] = 6;
@@ -467,7 +485,7 @@ class Builder {
   }
 
   void WriteIntegrity(std::vector<uint8_t> *img) {
-    uint8_t *p = SectorPtr(img, kIntegrity);
+    uint8_t *p = SectorPtr(img, at_.integrity);
     uint32_t n = opt_.metadataPartition ? 2 : 1;
     Timestamp(p + 16);
     W32(p + 28, 1);
@@ -479,21 +497,22 @@ class Builder {
     W16(p + iu + 40, rev_);
     W16(p + iu + 42, rev_);
     W16(p + iu + 44, rev_);
-    Tag(p, 9, tagVersion_, kIntegrity, iu + 46);
-    Tag(SectorPtr(img, kIntegrity + 1), 8, tagVersion_, kIntegrity + 1, 512);
+    Tag(p, 9, tagVersion_, at_.integrity, iu + 46);
+    Tag(SectorPtr(img, at_.integrity + 1), 8, tagVersion_, at_.integrity + 1, 512);
   }
 
   void WriteAnchor(std::vector<uint8_t> *img, uint32_t at) {
     uint8_t *p = SectorPtr(img, at);
     W32(p + 16, 16 * bs_);
-    W32(p + 20, kMainVds);
+    W32(p + 20, at_.mainVds);
     W32(p + 24, 16 * bs_);
-    W32(p + 28, kReserveVds);
+    W32(p + 28, at_.reserveVds);
     Tag(p, 2, tagVersion_, at, 512);
   }
 
   UdfBuildOptions opt_;
   uint32_t bs_;
+  Places at_;
   uint16_t rev_, tagVersion_;
   uint64_t nextUnique_ = 16;
   Space phys_, meta_;

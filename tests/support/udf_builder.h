@@ -32,6 +32,7 @@ struct UdfBuildOptions {
   bool scatterExtents = false;     // leave a junk block between extents
   uint32_t adsPerEntry = 0;        // >0: continue longer lists in AED blocks
   std::string volumeId = "TVXBUILT";
+  bool compact = false;  // structures before sector 256, the image ends with its anchor
 };
 
 // Where the builder put things. Sectors are absolute (byte offset / block
