@@ -18,27 +18,19 @@ std::string Hex(const uint8_t *p, size_t n) {
   return s;
 }
 
-const char kAbcSha256[] = "ba7816bf8f01cfea414140de5dae2223b00361a396177a9cb410ff61f20015ad";
-
-TEST(CryptoHash, KnownDigestsAndNames) {
+TEST(CryptoHash, KnownDigestAndStreamingAtEverySplit) {
   const CryptoHash *h = nullptr;
-  ASSERT_EQ(CryptoHash_FromString("sha-256", &h), CRYPTO_ERROR_SUCCESS);
-  ASSERT_EQ(CryptoHash_GetOutputSize(h), 32u);
-  uint8_t out[32];
-  ASSERT_EQ(CryptoHash_Compute(h, "abc", 3, out, sizeof out), CRYPTO_ERROR_SUCCESS);
-  EXPECT_EQ(Hex(out, 32), kAbcSha256);
-  EXPECT_EQ(CryptoHash_Compute(h, "abc", 3, out, 31), CRYPTO_ERROR_BAD_BUFFER_SIZE);
-
   EXPECT_EQ(CryptoHash_FromString("MD5", &h), CRYPTO_ERROR_UNKNOWN_ALGORITHM);
   EXPECT_EQ(h, nullptr);
-  EXPECT_STREQ(CryptoError_ToString(CRYPTO_ERROR_UNKNOWN_ALGORITHM), "unknown algorithm");
-}
-
-TEST(CryptoHash, StreamingMatchesOneShotAtEverySplit) {
-  std::string text = "The quick brown fox jumps over the lazy dog, again and again.";
-  const CryptoHash *h = nullptr;
   ASSERT_EQ(CryptoHash_FromString("SHA-256", &h), CRYPTO_ERROR_SUCCESS);
+  ASSERT_EQ(CryptoHash_FromString("sha-256", &h), CRYPTO_ERROR_SUCCESS);
+  ASSERT_EQ(CryptoHash_GetOutputSize(h), 32u);
   uint8_t want[32];
+  ASSERT_EQ(CryptoHash_Compute(h, "abc", 3, want, sizeof want), CRYPTO_ERROR_SUCCESS);
+  EXPECT_EQ(Hex(want, 32), "ba7816bf8f01cfea414140de5dae2223b00361a396177a9cb410ff61f20015ad");
+  EXPECT_EQ(CryptoHash_Compute(h, "abc", 3, want, 31), CRYPTO_ERROR_BAD_BUFFER_SIZE);
+
+  std::string text = "The quick brown fox jumps over the lazy dog, again and again.";
   ASSERT_EQ(CryptoHash_Compute(h, text.data(), text.size(), want, 32), CRYPTO_ERROR_SUCCESS);
   for (size_t split = 0; split <= text.size(); split++) {
     CryptoHashSHA256Context ctx;

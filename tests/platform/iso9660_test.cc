@@ -1,5 +1,5 @@
 // The ISO 9660 reader on images mastered from tests/data/iso9660/tree by real
-// mastering tools: formats, lookups and file records. Names per open mode
+// mastering tools: lookups and file records. Formats, names per open mode
 // and bytes are compared with other readers in iso9660_oracle_test.
 #include <gtest/gtest.h>
 
@@ -26,19 +26,8 @@ struct Opened {
   }
 };
 
-TEST(Iso9660Media, FormatsPresent) {
-  struct Case {
-    const char *image;
-    uint32_t formats;
-  } cases[] = {
-      {"rr-joliet.iso", 7}, {"rr-relocated.iso", 7}, {"joliet-only.iso", 3},
-      {"plain-l1.iso", 1},  {"udf-bridge.iso", 7},
-  };
-  for (const Case &c : cases) {
-    uint32_t formats = 0;
-    EXPECT_EQ(Iso9660_ListFormats(Image(c.image).c_str(), &formats), ISO9660_OK) << c.image;
-    EXPECT_EQ(formats, c.formats) << c.image;
-  }
+// The formats each image records are checked in iso9660_oracle_test.
+TEST(Iso9660Media, UnreadableImagesAndBadModes) {
   uint32_t formats = 0;
   EXPECT_EQ(Iso9660_ListFormats(Image("missing.iso").c_str(), &formats), ISO9660_ERR_IO);
   Opened o;

@@ -1,15 +1,29 @@
+#include "platform/log.h"
 #include "platform/msg.h"
 
 #include <gtest/gtest.h>
 
 #include <cstdlib>
 #include <string>
+#include <vector>
 
 #include "support/log_capture.h"
 
 namespace {
 
 using tvxtest::Take;
+
+TEST(Log, SinkReceivesExactTextHoweverLong) {
+  tvxtest::LogCapture cap;
+  Log("%s: FileIO_Open failed, error: %d\n", "AddFileToFloppyImg", 6);
+  Warning("no newline here");
+  Log_Level(6, "detail %u\n", 7u);
+  std::string big(5000, 'x');
+  Log("%s\n", big.c_str());
+  EXPECT_EQ(cap.Lines(),
+            (std::vector<std::string>{"AddFileToFloppyImg: FileIO_Open failed, error: 6\n",
+                                      "no newline here", "detail 7\n", big + "\n"}));
+}
 
 TEST(Msg, DefaultTextsWithoutCatalogue) {
   Msg_SetLocale("");
@@ -40,10 +54,6 @@ TEST(Msg, PendingMessagesJoinAndReset) {
   EXPECT_EQ(Take(Msg_GetMessagesAndReset()), "line 3: bad; second");
   EXPECT_EQ(Take(Msg_GetMessagesAndReset()), "");
 }
-
-}  // namespace
-
-namespace {
 
 TEST(MsgCatalogue, LocaleHitMissAndFaultyTranslations) {
   tvxtest::TempDir t;

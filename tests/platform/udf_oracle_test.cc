@@ -3,13 +3,10 @@
 #include <gtest/gtest.h>
 
 #include <cstdlib>
-#include <filesystem>
 
 #include "support/log_capture.h"
 #include "support/udf_builder.h"
 #include "support/udf_walk.h"
-
-namespace fs = std::filesystem;
 
 namespace {
 
@@ -21,16 +18,7 @@ tvxtest::UdfTree SevenZipTree(const std::string &image, const std::string &dir) 
   std::string cmd = "7z l -slt '" + image + "' | grep -qx 'Type = Udf' && 7z x -y -o'" + dir +
                     "' '" + image + "' >/dev/null";
   EXPECT_EQ(std::system(cmd.c_str()), 0) << cmd;
-  tvxtest::UdfTree tree;
-  for (const auto &e : fs::recursive_directory_iterator(dir)) {
-    std::string rel = fs::relative(e.path(), dir).string();
-    if (e.is_directory()) {
-      tree.dirs[rel] = true;
-    } else {
-      tree.files[rel] = tvxtest::ReadFileOrDie(e.path().string());
-    }
-  }
-  return tree;
+  return tvxtest::HostTree(dir);
 }
 
 }  // namespace

@@ -41,19 +41,6 @@ TEST(Util, CompareDottedHandlesUnevenVersionsAndTails) {
   }
 }
 
-TEST(Util, SafeAllocationsAreZeroedAndNullTolerant) {
-  char *p = static_cast<char *>(UtilSafeMalloc0(0));
-  ASSERT_NE(p, nullptr);
-  std::free(p);
-  auto *z = static_cast<unsigned char *>(UtilSafeMalloc0(64));
-  for (int i = 0; i < 64; i++) EXPECT_EQ(z[i], 0) << i;
-  std::free(z);
-  EXPECT_EQ(UtilSafeStrdup0(nullptr), nullptr);
-  char *n = UtilSafeStrndup0("abcdef", 3);
-  EXPECT_STREQ(n, "abc");
-  std::free(n);
-}
-
 TEST(DynBuf, AppendsGrowAndDetachTerminatesEmpty) {
   DynBuf b;
   DynBuf_Init(&b);

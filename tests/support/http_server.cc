@@ -21,19 +21,51 @@ extern char **environ;
 
 namespace tvxtest {
 
-HttpServer::HttpServer(std::map<std::string, std::string> files, Mode mode)
-    : files_(std::move(files)), mode_(mode) {
-  listenFd_ = socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
+namespace {
+
+sockaddr_in Loopback(int port) {
   sockaddr_in addr{};
   addr.sin_family = AF_INET;
   addr.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+  addr.sin_port = htons(static_cast<uint16_t>(port));
+  return addr;
+}
+
+// Bind binds `fd` to a free loopback port and returns it (0 on failure).
+int Bind(int fd) {
+  sockaddr_in addr = Loopback(0);
   socklen_t len = sizeof addr;
-  if (listenFd_ < 0 || bind(listenFd_, reinterpret_cast<sockaddr *>(&addr), sizeof addr) != 0 ||
-      listen(listenFd_, 8) != 0 ||
-      getsockname(listenFd_, reinterpret_cast<sockaddr *>(&addr), &len) != 0) {
+  if (fd < 0 || bind(fd, reinterpret_cast<sockaddr *>(&addr), sizeof addr) != 0 ||
+      getsockname(fd, reinterpret_cast<sockaddr *>(&addr), &len) != 0) {
+    return 0;
+  }
+  return ntohs(addr.sin_port);
+}
+
+int FreePort() {
+  int fd = socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
+  int port = Bind(fd);
+  if (fd >= 0) close(fd);
+  return port;
+}
+
+bool Accepts(int port) {
+  int fd = socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
+  sockaddr_in addr = Loopback(port);
+  bool ok = fd >= 0 && connect(fd, reinterpret_cast<sockaddr *>(&addr), sizeof addr) == 0;
+  if (fd >= 0) close(fd);
+  return ok;
+}
+
+}  // namespace
+
+HttpServer::HttpServer(std::map<std::string, std::string> files, Mode mode)
+    : files_(std::move(files)), mode_(mode) {
+  listenFd_ = socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
+  port_ = Bind(listenFd_);
+  if (port_ == 0 || listen(listenFd_, 8) != 0) {
     throw std::runtime_error("test HTTP server cannot listen");
   }
-  port_ = ntohs(addr.sin_port);
   thread_ = std::thread([this] { Run(); });
 }
 
@@ -131,36 +163,6 @@ void HttpServer::Serve(int fd) {
     sent += static_cast<size_t>(n);
   }
 }
-
-namespace {
-
-int FreePort() {
-  int fd = socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
-  sockaddr_in addr{};
-  addr.sin_family = AF_INET;
-  addr.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-  socklen_t len = sizeof addr;
-  int port = 0;
-  if (fd >= 0 && bind(fd, reinterpret_cast<sockaddr *>(&addr), sizeof addr) == 0 &&
-      getsockname(fd, reinterpret_cast<sockaddr *>(&addr), &len) == 0) {
-    port = ntohs(addr.sin_port);
-  }
-  if (fd >= 0) close(fd);
-  return port;
-}
-
-bool Accepts(int port) {
-  int fd = socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
-  sockaddr_in addr{};
-  addr.sin_family = AF_INET;
-  addr.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-  addr.sin_port = htons(static_cast<uint16_t>(port));
-  bool ok = fd >= 0 && connect(fd, reinterpret_cast<sockaddr *>(&addr), sizeof addr) == 0;
-  if (fd >= 0) close(fd);
-  return ok;
-}
-
-}  // namespace
 
 WebServer::WebServer(const std::string &docRoot) {
   std::string tmpl = (std::filesystem::temp_directory_path() / "tvxweb-XXXXXX").string();

@@ -1,12 +1,8 @@
 #include "support/test_pki.h"
 
-#include <sys/wait.h>
-#include <unistd.h>
-
 #include <vector>
 
 #include "support/log_capture.h"
-
 
 #ifndef TVX_TEST_CERT_DIR
 #define TVX_TEST_CERT_DIR ""

@@ -15,10 +15,6 @@ namespace tvxtest {
 // they never write to a system directory.
 std::string TestCertDir();
 
-// Signers of the test PKI.
-inline constexpr const char *kPkiSigners[] = {"maker",   "partner", "stranger",    "expired",
-                                              "revoked", "deep",    "deepstranger"};
-
 // Sign returns a PEM PKCS#7 signature of `data` by `signer` of the PKI in
 // `pkiDir`, detached or with the content embedded; empty on failure.
 std::string Sign(const std::string &pkiDir, const std::string &signer, const std::string &data,

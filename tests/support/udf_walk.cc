@@ -1,6 +1,9 @@
 #include "support/udf_walk.h"
 
 #include <cstring>
+#include <filesystem>
+#include <fstream>
+#include <sstream>
 #include <vector>
 
 namespace tvxtest {
@@ -79,6 +82,21 @@ UdfTree WalkUdfImage(const std::string &path, bool *opened) {
   if (volume == nullptr) return {};
   UdfTree tree = WalkUdf(volume);
   UDF_Close(volume);
+  return tree;
+}
+
+UdfTree HostTree(const std::string &dir) {
+  UdfTree tree;
+  for (const auto &e : std::filesystem::recursive_directory_iterator(dir)) {
+    std::string rel = std::filesystem::relative(e.path(), dir).string();
+    if (e.is_directory()) {
+      tree.dirs[rel] = true;
+    } else {
+      std::ostringstream bytes;
+      bytes << std::ifstream(e.path(), std::ios::binary).rdbuf();
+      tree.files[rel] = bytes.str();
+    }
+  }
   return tree;
 }
 

@@ -1,5 +1,6 @@
 // Walks a whole UDF volume through the public calls, for comparisons with
-// other readers and for hostile-image tests.
+// other readers and for hostile-image tests; and a directory that another
+// reader extracted, into the same shape.
 #pragma once
 
 #include <cstdint>
@@ -27,5 +28,8 @@ UdfTree WalkUdf(UDFVolume *volume);
 
 // Opens the image at `path` and walks it; `opened` says whether it opened.
 UdfTree WalkUdfImage(const std::string &path, bool *opened);
+
+// HostTree reads every directory and file below `dir` on disk.
+UdfTree HostTree(const std::string &dir);
 
 }  // namespace tvxtest
