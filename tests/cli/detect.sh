@@ -3,10 +3,8 @@
 # what a person sees, exit statuses, and the error lines for images that
 # cannot be opened.
 set -uo pipefail
-tool=${TVX_TOOL:?} media=${TVX_MEDIA_DIR:?}
+media=${TVX_MEDIA_DIR:?}
 . "$(dirname "$0")/lib/check.sh"
-tmp=$(mktemp -d)
-trap 'rm -rf "$tmp"' EXIT
 
 # Every image of the shelf, then a missing file and noise: the two that fail
 # are reported and the run goes on.

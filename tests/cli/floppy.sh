@@ -1,15 +1,11 @@
 #!/usr/bin/env bash
-# tvxguest floppy and unattended windows --floppy: every image the tool writes
-# is checked with fsck.fat and read back with mtools; exit statuses.
+# tvxguest floppy and unattended windows --floppy: images checked with fsck.fat
+# and read back with mtools (the answer floppy's contents are the library's
+# test); exit statuses.
 set -uo pipefail
-tool=${TVX_TOOL:?} media=${TVX_MEDIA_DIR:?} src=${TVX_SOURCE_DIR:?}
+media=${TVX_MEDIA_DIR:?} src=${TVX_SOURCE_DIR:?}
 . "$(dirname "$0")/lib/check.sh"
-if ! "$tool" floppy --help >/dev/null 2>&1; then
-  echo "skip: this tool has no 'floppy' command"
-  exit 0
-fi
-tmp=$(mktemp -d)
-trap 'rm -rf "$tmp"' EXIT
+need_command floppy
 export MTOOLS_SKIP_CHECK=1
 clean() { fsck.fat -n "$1" >"$tmp/fsck" 2>&1 && ! grep -qE 'rror|ong file|ree cluster|Fix|orrect' "$tmp/fsck"; }
 img=$tmp/f.flp
@@ -56,7 +52,6 @@ if [ -e "$winxp" ]; then
     --out "$tmp/xp" --floppy --resource-dir "$tmp/res" --scsi-dir "$tmp/drv" "$winxp" >"$tmp/out" 2>&1
   check "unattended windows --floppy: exit 0" test $? -eq 0
   check "only autoinst.flp stays" test "$(ls "$tmp/xp")" = autoinst.flp
-  check "the floppy is clean" clean "$tmp/xp/autoinst.flp"
   mdir -b -i "$tmp/xp/autoinst.flp" ::/ >"$tmp/names"
   check "mtools lists answer files, helpers and drivers" test "$(sort "$tmp/names" | tr '\n' ' ')" = \
     "::/autoun~0.xml ::/lsi_sas.sys ::/storePwd.exe ::/storePwd.ini ::/txtsetup.oem ::/unattend.cmd ::/winnt.sif "

@@ -1,21 +1,15 @@
 #!/usr/bin/env bash
 # tvxguest unattended linux and tvxguest crypt: answer files for recognised
-# Linux media read back by their own parsers, passwords checked with the
-# crypt command and openssl, hostile texts run through the shell, and
-# failing calls that leave nothing behind.
+# Linux media carry the typed texts as given (each language's own parser reads
+# them in the library's test), the passwords verify with the crypt command and
+# openssl, and failing calls leave nothing behind.
 set -uo pipefail
-tool=${TVX_TOOL:?} media=${TVX_MEDIA_DIR:?}
+media=${TVX_MEDIA_DIR:?}
 . "$(dirname "$0")/lib/check.sh"
-if ! "$tool" unattended linux --help >/dev/null 2>&1; then
-  echo "skip: this tool has no 'unattended linux' command"
-  exit 0
-fi
-tmp=$(mktemp -d)
-trap 'rm -rf "$tmp"' EXIT
+need_command unattended linux
 name='Jo "JJ" O'"'"'Neil & Co <x> Zoë 王'
 password='$(touch x)`touch x`'
 root_password='r00t ${HOME} @ARGV'
-usable() { [ -e "$1" ] && "$tool" detect "$1" >/dev/null 2>&1; }
 answers() {  # answers OUTDIR IMAGE EXTRA...
   local out=$1 img=$2; shift 2
   "$tool" unattended linux --user jo --full-name "$name" --password "$password" \
@@ -33,8 +27,6 @@ if usable "$centos"; then
   check "centos7: owner-only file" test "$(stat -c %a "$ks")" = 600
   check "centos7: root password verifies" \
     verifies "$root_password" "$(sed -n 's/^rootpw --iscrypted //p' "$ks")"
-  sed -n '/^%post$/,/^%end$/p' "$ks" | sed '1d;$d' >"$tmp/post.sh"
-  check "centos7: %post passes sh -n" sh -n "$tmp/post.sh"
 fi
 
 ubuntu=$media/debian/ubu-2004.iso
@@ -44,7 +36,6 @@ if usable "$ubuntu"; then
   check "ubuntu --json: the preseed file" \
     grep -qF "\"files\": [\"$tmp/ub/custom/preseed.cfg\"]" "$tmp/json"
   ps=$tmp/ub/custom/preseed.cfg
-  check "ubuntu: debconf reads the file" debconf-set-selections -c "$ps"
   check "ubuntu: full name as typed" \
     grep -qxF "ubiquity   passwd/user-fullname string   $name" "$ps"
   check "ubuntu: password verifies" \
@@ -55,7 +46,6 @@ sles=$media/suse/sles11.iso
 if usable "$sles"; then
   answers "$tmp/su" "$sles" >/dev/null 2>&1
   xml=$tmp/su/autoinst.xml
-  check "sles11: xmllint accepts the profile" xmllint --noout "$xml"
   check "sles11: forename intact" \
     test "$(xmllint --xpath "string(//*[local-name()='forename'])" "$xml")" = "$name"
   check "sles11: root password verifies" verifies "$root_password" \
@@ -75,10 +65,8 @@ check "no staging directory left" test -z "$(find "$tmp" -name '*.staging-*')"
 "$tool" unattended linux --full-name x --password p --out "$tmp/u" "$centos" >/dev/null 2>&1
 check "missing --user: exit 64" test $? -eq 64
 
-# crypt: a published vector; a random salt and clamped rounds cross-checked
-# with openssl.
-check "crypt: published vector" test "$("$tool" crypt --salt '$5$saltstring' 'Hello world!')" = \
-  '$5$saltstring$5B8vYYiY.CVt1RlTTf8KbXBH3hsxY/GNooZaBBGWEc5'
+# crypt: a random salt and clamped rounds cross-checked with openssl (the
+# published vectors are the library's test).
 hash=$(printf '%s\n' "$password" | "$tool" crypt --stdin)
 salt=$(printf '%s' "$hash" | cut -d'$' -f3)
 check "crypt: openssl agrees" test "$(openssl passwd -5 -salt "$salt" "$password")" = "$hash"

@@ -3,10 +3,7 @@
 # install media mastered here (images and the same trees unpacked), read
 # back with isoinfo, and the floppy checked with fsck.fat and mtools.
 set -uo pipefail
-tool=${TVX_TOOL:?}
 . "$(dirname "$0")/lib/check.sh"
-tmp=$(mktemp -d)
-trap 'rm -rf "$tmp"' EXIT
 bin=/usr/lib/ISOLINUX/isolinux.bin ldlinux=/usr/lib/syslinux/modules/bios/ldlinux.c32
 master() { xorriso -as mkisofs -quiet -R -J -o "$2" "$1" 2>/dev/null; }
 

@@ -5,8 +5,9 @@ namespace {
 using tvxtest::ExpectGuess;
 using tvxtest::GuessRow;
 
-TEST(GuessFreeBSD, KernelMachineAndRelease) {
+TEST(GuessFreeBSDNetWare, MasteredMedia) {
   const GuessRow rows[] = {
+      // FreeBSD: the kernel's machine and the release.
       {"freebsd/fbsd13-64", "freeBSD13-64"},
       {"freebsd/fbsd13-32", "freeBSD13"},
       {"freebsd/fbsd13-arm", "arm-freeBSD13-64"},
@@ -25,22 +26,12 @@ TEST(GuessFreeBSD, KernelMachineAndRelease) {
       {"freebsd/fbsd4-old", "freeBSD"},
       // Plain ISO 9660 shows the kernel as "KERNEL.".
       {"freebsd/fbsd13-plain", "freeBSD13-64"},
-  };
-  for (const GuessRow &row : rows) ExpectGuess(row);
-}
-
-TEST(GuessFreeBSD, UnusableKernel) {
-  const GuessRow rows[] = {
+      // FreeBSD: unusable kernels.
       {"freebsd/fbsd-arm32", nullptr},
       {"freebsd/fbsd-short", nullptr},
       {"freebsd/fbsd-empty", nullptr},
       {"freebsd/fbsd-notes-only", nullptr},
-  };
-  for (const GuessRow &row : rows) ExpectGuess(row);
-}
-
-TEST(GuessNetWare, FirstListedReleaseDirectory) {
-  const GuessRow rows[] = {
+      // NetWare: the first listed release directory.
       {"netware/nw65", "netware6"},
       {"netware/nw6-upper", "netware6"},
       {"netware/nw51-first", "netware5"},

@@ -2,94 +2,72 @@
 
 namespace {
 
-using tvxtest::ExpectGuess;
+using tvxtest::ExpectGuesses;
 using tvxtest::GuessRow;
 using tvxtest::kIso;
 using tvxtest::kNoIso;
 
-TEST(GuessDebian, DebianReleaseAndArchitecture) {
+TEST(GuessDebian, MasteredMedia) {
   const GuessRow rows[] = {
-      {"debian/deb4-i386", "debian4", 0, kIso},
-      {"debian/deb5-amd64", "debian5-64", 0, kIso},
-      {"debian/deb6-i386", "debian6", 0, kIso},
-      {"debian/deb7-amd64", "debian7-64", 0, kIso},
-      {"debian/deb8-i386", "debian8", 0, kIso},
-      {"debian/deb9-amd64", "debian9-64", 0, kIso},
+      // Debian release and architecture.
+      {"deb4-i386", "debian4", 0, kIso},
+      {"deb5-amd64", "debian5-64", 0, kIso},
+      {"deb6-i386", "debian6", 0, kIso},
+      {"deb7-amd64", "debian7-64", 0, kIso},
+      {"deb8-i386", "debian8", 0, kIso},
+      {"deb9-amd64", "debian9-64", 0, kIso},
       // Arm before 10 has no Debian identifier of its own.
-      {"debian/deb9-arm64", "arm-ubuntu-64", 0, kNoIso},
-      {"debian/deb10-amd64", "debian10-64", 0, kIso},
-      {"debian/deb10-arm64", "arm-debian10-64", 0, kNoIso},
-      {"debian/deb11-amd64", "debian11-64", 0, kIso},
-      {"debian/deb11-arm64", "arm-debian11-64", 0, kNoIso},
-      {"debian/deb11-noisolinux", "debian11", 0, kNoIso},
-      {"debian/deb12-amd64", nullptr},
-      {"debian/deb10-noarch", nullptr},
-      {"debian/deb-amd64-first", nullptr},
-  };
-  for (const GuessRow &row : rows) ExpectGuess(row);
-}
-
-TEST(GuessDebian, UbuntuDesktopClasses) {
-  const GuessRow rows[] = {
-      {"debian/ubu-704", "ubuntu", GUESS_VERSION_UBUNTU_704_OR_LOWER, kIso, "7.04"},
-      {"debian/ubu-710", "ubuntu", GUESS_VERSION_UBUNTU_710_OR_HIGHER, kIso, "7.10"},
-      {"debian/kubu-804", "ubuntu-64", GUESS_VERSION_UBUNTU_710_OR_HIGHER, kIso, "8.04"},
-      {"debian/xubu-1004", "ubuntu", GUESS_VERSION_UBUNTU_710_OR_HIGHER, kIso, "10.04"},
-      {"debian/edubu-804", "ubuntu", GUESS_VERSION_UBUNTU_710_OR_HIGHER, kIso, "8.04"},
-      {"debian/ubu-1404", "ubuntu-64", GUESS_VERSION_UBUNTU_1404, kIso, "14.04"},
-      {"debian/ubu-140402", "ubuntu-64", GUESS_VERSION_UBUNTU_1404, kIso, "14.04.2"},
-      {"debian/ubu-1410", "ubuntu-64", GUESS_VERSION_UBUNTU_1410, kIso, "14.10"},
-      {"debian/ubu-1504", "ubuntu", GUESS_VERSION_UBUNTU_1504_TO_2004, kIso, "15.04"},
-      {"debian/ubu-2004", "ubuntu-64", GUESS_VERSION_UBUNTU_1504_TO_2004, kIso, "20.04.1"},
-      {"debian/ubu-2004-noiso", "ubuntu-64", GUESS_VERSION_UBUNTU_1504_TO_2004, kNoIso, "20.04.1"},
+      {"deb9-arm64", "arm-ubuntu-64", 0, kNoIso},
+      {"deb10-amd64", "debian10-64", 0, kIso},
+      {"deb10-arm64", "arm-debian10-64", 0, kNoIso},
+      {"deb11-amd64", "debian11-64", 0, kIso},
+      {"deb11-arm64", "arm-debian11-64", 0, kNoIso},
+      {"deb11-noisolinux", "debian11", 0, kNoIso},
+      {"deb12-amd64", nullptr},
+      {"deb10-noarch", nullptr},
+      {"deb-amd64-first", nullptr},
+      // Ubuntu desktop classes.
+      {"ubu-704", "ubuntu", GUESS_VERSION_UBUNTU_704_OR_LOWER, kIso, "7.04"},
+      {"ubu-710", "ubuntu", GUESS_VERSION_UBUNTU_710_OR_HIGHER, kIso, "7.10"},
+      {"kubu-804", "ubuntu-64", GUESS_VERSION_UBUNTU_710_OR_HIGHER, kIso, "8.04"},
+      {"xubu-1004", "ubuntu", GUESS_VERSION_UBUNTU_710_OR_HIGHER, kIso, "10.04"},
+      {"edubu-804", "ubuntu", GUESS_VERSION_UBUNTU_710_OR_HIGHER, kIso, "8.04"},
+      {"ubu-1404", "ubuntu-64", GUESS_VERSION_UBUNTU_1404, kIso, "14.04"},
+      {"ubu-140402", "ubuntu-64", GUESS_VERSION_UBUNTU_1404, kIso, "14.04.2"},
+      {"ubu-1410", "ubuntu-64", GUESS_VERSION_UBUNTU_1410, kIso, "14.10"},
+      {"ubu-1504", "ubuntu", GUESS_VERSION_UBUNTU_1504_TO_2004, kIso, "15.04"},
+      {"ubu-2004", "ubuntu-64", GUESS_VERSION_UBUNTU_1504_TO_2004, kIso, "20.04.1"},
+      {"ubu-2004-noiso", "ubuntu-64", GUESS_VERSION_UBUNTU_1504_TO_2004, kNoIso, "20.04.1"},
       // From 20.10 on the isolinux probe is overruled.
-      {"debian/ubu-2010", "ubuntu-64", GUESS_VERSION_UBUNTU_2010_OR_HIGHER, kIso, "20.10"},
-      {"debian/ubu-2204-arm", "arm-ubuntu-64", GUESS_VERSION_UBUNTU_2010_OR_HIGHER, kIso,
-       "22.04.3"},
+      {"ubu-2010", "ubuntu-64", GUESS_VERSION_UBUNTU_2010_OR_HIGHER, kIso, "20.10"},
+      {"ubu-2204-arm", "arm-ubuntu-64", GUESS_VERSION_UBUNTU_2010_OR_HIGHER, kIso, "22.04.3"},
       // One word: no version word, so no class beyond the first and no text.
-      {"debian/ubu-oneword", "ubuntu-64", GUESS_VERSION_UBUNTU_704_OR_LOWER, kNoIso, ""},
+      {"ubu-oneword", "ubuntu-64", GUESS_VERSION_UBUNTU_704_OR_LOWER, kNoIso, ""},
       // Not recognised, but the version text is already written.
-      {"debian/ubu-noarch", nullptr, 0, false, "18.04.5"},
-  };
-  for (const GuessRow &row : rows) ExpectGuess(row);
-}
-
-TEST(GuessDebian, UbuntuServerClasses) {
-  const GuessRow rows[] = {
-      {"debian/srv-804", "ubuntu", GUESS_VERSION_UBUNTU_SERVER_804_OR_LOWER, kIso, "Server 8.04.4"},
-      {"debian/srv-810", "ubuntu-64", GUESS_VERSION_UBUNTU_SERVER_810_OR_HIGHER, kIso,
-       "Server 8.10"},
-      {"debian/srv-1404", "ubuntu-64", GUESS_VERSION_UBUNTU_SERVER_1404, kIso, "Server 14.04.1"},
-      {"debian/srv-140402", "ubuntu-64", GUESS_VERSION_UBUNTU_SERVER_140402, kIso,
-       "Server 14.04.2"},
-      {"debian/srv-140405", "ubuntu", GUESS_VERSION_UBUNTU_SERVER_140402, kIso, "Server 14.04.5"},
-      {"debian/srv-1410", "ubuntu-64", GUESS_VERSION_UBUNTU_SERVER_1410, kIso, "Server 14.10"},
-      {"debian/srv-1604", "ubuntu-64", GUESS_VERSION_UBUNTU_SERVER_1504_OR_HIGHER, kIso,
-       "Server 16.04.7"},
-  };
-  for (const GuessRow &row : rows) ExpectGuess(row);
-}
-
-TEST(GuessDebian, DamagedInfoFiles) {
-  const GuessRow rows[] = {
-      {"debian/bad-empty", nullptr},
-      {"debian/bad-binary", nullptr},
+      {"ubu-noarch", nullptr, 0, false, "18.04.5"},
+      // Ubuntu server classes.
+      {"srv-804", "ubuntu", GUESS_VERSION_UBUNTU_SERVER_804_OR_LOWER, kIso, "Server 8.04.4"},
+      {"srv-810", "ubuntu-64", GUESS_VERSION_UBUNTU_SERVER_810_OR_HIGHER, kIso, "Server 8.10"},
+      {"srv-1404", "ubuntu-64", GUESS_VERSION_UBUNTU_SERVER_1404, kIso, "Server 14.04.1"},
+      {"srv-140402", "ubuntu-64", GUESS_VERSION_UBUNTU_SERVER_140402, kIso, "Server 14.04.2"},
+      {"srv-140405", "ubuntu", GUESS_VERSION_UBUNTU_SERVER_140402, kIso, "Server 14.04.5"},
+      {"srv-1410", "ubuntu-64", GUESS_VERSION_UBUNTU_SERVER_1410, kIso, "Server 14.10"},
+      {"srv-1604", "ubuntu-64", GUESS_VERSION_UBUNTU_SERVER_1504_OR_HIGHER, kIso, "Server 16.04.7"},
+      // Damaged info files.
+      {"bad-empty", nullptr},
+      {"bad-binary", nullptr},
       // The text ends at its first NUL byte: no architecture word is left.
-      {"debian/bad-nul-early", nullptr},
+      {"bad-nul-early", nullptr},
       // The CR LF only touches the last word.
-      {"debian/bad-crlf", "ubuntu-64", GUESS_VERSION_UBUNTU_1504_TO_2004, kIso, "20.04.1"},
-      {"debian/bad-spaces", nullptr, 0, false, ""},
+      {"bad-crlf", "ubuntu-64", GUESS_VERSION_UBUNTU_1504_TO_2004, kIso, "20.04.1"},
+      {"bad-spaces", nullptr, 0, false, ""},
       // Cut to 31 characters.
-      {"debian/bad-longword", "ubuntu-64", GUESS_VERSION_UBUNTU_1404, kNoIso,
+      {"bad-longword", "ubuntu-64", GUESS_VERSION_UBUNTU_1404, kNoIso,
        "14.04.0000000000000000000000000"},
-      {"debian/bad-huge", "ubuntu-64", GUESS_VERSION_UBUNTU_1504_TO_2004, kNoIso, "20.04"},
+      {"bad-huge", "ubuntu-64", GUESS_VERSION_UBUNTU_1504_TO_2004, kNoIso, "20.04"},
+      {"ubu-2004-udf", "ubuntu-64", GUESS_VERSION_UBUNTU_1504_TO_2004, kIso, "20.04.1"},
   };
-  for (const GuessRow &row : rows) ExpectGuess(row);
-}
-
-TEST(GuessDebian, UdfBridgeImage) {
-  ExpectGuess(
-      {"debian/ubu-2004-udf", "ubuntu-64", GUESS_VERSION_UBUNTU_1504_TO_2004, kIso, "20.04.1"});
+  ExpectGuesses("debian", rows);
 }
 
 }  // namespace

@@ -2,57 +2,51 @@
 
 namespace {
 
-using tvxtest::ExpectGuess;
+using tvxtest::ExpectGuesses;
 using tvxtest::GuessRow;
 
-TEST(GuessOrka, PackagesXml) {
+TEST(GuessOrka, MasteredMedia) {
   const GuessRow rows[] = {
-      {"orka/orka41", "zelcore"},
-      {"orka/orka35", nullptr},
-      {"orka/orka-caseless", "zelcore"},
-      {"orka/orka-vfirst", "zelcore"},
+      // Orka: packages.xml.
+      {"orka41", "zelcore"},
+      {"orka35", nullptr},
+      {"orka-caseless", "zelcore"},
+      {"orka-vfirst", "zelcore"},
       // The walk stops once both texts are known; before that a later
       // element replaces an earlier one.
-      {"orka/orka-stop-early", nullptr},
-      {"orka/orka-replaced", nullptr},
+      {"orka-stop-early", nullptr},
+      {"orka-replaced", nullptr},
       // Only the first product element counts.
-      {"orka/orka-2nd-prod", nullptr},
-      {"orka/orka-emptyname", nullptr},
-      {"orka/orka-cdata", nullptr},
-      {"orka/orka-noproduct", nullptr},
-      {"orka/orka-wrongroot", nullptr},
-  };
-  for (const GuessRow &row : rows) ExpectGuess(row);
-}
-
-// Entities are never substituted and nothing outside the medium is read.
-TEST(GuessOrka, HostileXml) {
-  const GuessRow rows[] = {
-      {"orka/orka-entity", nullptr}, {"orka/orka-external", nullptr},
-      {"orka/orka-laughs", nullptr}, {"orka/orka-truncated", nullptr},
-      {"orka/orka-binary", nullptr}, {"orka/orka-empty", nullptr},
-  };
-  for (const GuessRow &row : rows) ExpectGuess(row);
-}
-
-TEST(GuessOrkai, BootMenuTitle) {
-  const GuessRow rows[] = {
-      {"orka/orkai65", "zelcore65"},
-      {"orka/hyperlet", "zelcore"},
-      {"orka/orkai5", "zelcore5"},
-      {"orka/orkai60", "zelcore6"},
-      {"orka/skyvault60", "zelcore6"},
-      {"orka/skyvault67", "zelcore65"},
-      {"orka/orkai-lower", nullptr},
-      {"orka/orkai70", "zelcore7"},
-      {"orka/orkai70-x64", "zelcore7"},
-      {"orka/orkai70-both", "zelcore7"},
+      {"orka-2nd-prod", nullptr},
+      {"orka-emptyname", nullptr},
+      {"orka-cdata", nullptr},
+      {"orka-noproduct", nullptr},
+      {"orka-wrongroot", nullptr},
+      // Orka, hostile packages.xml: entities are never substituted and nothing outside the
+      // medium is read.
+      {"orka-entity", nullptr},
+      {"orka-external", nullptr},
+      {"orka-laughs", nullptr},
+      {"orka-truncated", nullptr},
+      {"orka-binary", nullptr},
+      {"orka-empty", nullptr},
+      // Orka installer: the boot menu title.
+      {"orkai65", "zelcore65"},
+      {"hyperlet", "zelcore"},
+      {"orkai5", "zelcore5"},
+      {"orkai60", "zelcore6"},
+      {"skyvault60", "zelcore6"},
+      {"skyvault67", "zelcore65"},
+      {"orkai-lower", nullptr},
+      {"orkai70", "zelcore7"},
+      {"orkai70-x64", "zelcore7"},
+      {"orkai70-both", "zelcore7"},
       // An Arm-only 7.0 medium is not for this identifier.
-      {"orka/orkai70-arm", nullptr},
-      {"orka/orkai80", nullptr},
-      {"orka/orkai-crlf", "zelcore65"},
+      {"orkai70-arm", nullptr},
+      {"orkai80", nullptr},
+      {"orkai-crlf", "zelcore65"},
   };
-  for (const GuessRow &row : rows) ExpectGuess(row);
+  ExpectGuesses("orka", rows);
 }
 
 }  // namespace

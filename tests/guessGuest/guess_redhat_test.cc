@@ -7,77 +7,69 @@ namespace {
 using tvxtest::ExpectGuesses;
 using tvxtest::GuessRow;
 
-TEST(GuessRedHat, EnterpriseLinux) {
-  const GuessRow rows[] = {{"rhel3-x86", "rhel3"},
-                           {"rhel3-x64", "rhel3-64"},
-                           {"rhel4-x64", "rhel4-64"},
-                           {"rhel4-x86", "rhel4"},
-                           {"rhel5-server-x64", "rhel5-64"},
-                           {"rhel5-client-x86", "rhel5"},
-                           {"rhel6-x64", "rhel6-64"},
-                           {"rhel6-x86", "rhel6"},
-                           {"rhel7-server-name", "rhel7-64", GUESS_VERSION_RHEL_SERVER},
-                           {"rhel7-workstation-name", "rhel7-64", GUESS_VERSION_RHEL_WORKSTATION},
-                           {"rhel7-client-name", "rhel7-64", GUESS_VERSION_RHEL_CLIENT},
-                           // Workstation wins over Server, Server over Client.
-                           {"rhel7-server-workstation", "rhel7-64", GUESS_VERSION_RHEL_WORKSTATION},
-                           {"rhel7-client", "rhel7-64", GUESS_VERSION_RHEL_CLIENT},
-                           {"rhel7-server", "rhel7", GUESS_VERSION_RHEL_SERVER},
-                           {"rhel7-no-treeinfo", nullptr},
-                           {"rhel7-treeinfo-empty", nullptr},
-                           // Without .discinfo the boot configuration tells RHEL 7; the CentOS
-                           // key generation still gives the class.
-                           {"rhel7-boot-x64", "rhel7-64", GUESS_VERSION_CENTOS_7_MINIMAL},
-                           {"rhel7-boot-x86", "rhel7"},
-                           {"rhel7-boot-noarch", nullptr},
-                           // RHEL 8 has one identifier whatever the architecture line says.
-                           {"rhel8-x64", "rhel8-64"},
-                           {"rhel8-x86", "rhel8-64"},
-                           {"rhel21", "rhel2", 0, true},
-                           {"rhel3-notes", nullptr},
-                           {"redhat9", "redhat", GUESS_VERSION_CENTOS_3},
-                           {"notes-blank", nullptr}};
-  ExpectGuesses("redhat", rows);
-}
-
-TEST(GuessRedHat, CentOS) {
-  const GuessRow rows[] = {{"centos3-x86", "centos", GUESS_VERSION_CENTOS_3},
-                           {"centos4-x64", "centos-64", GUESS_VERSION_CENTOS_4},
-                           // The key comes before the release-name rows.
-                           {"centos5-rhel-name", "centos-64", GUESS_VERSION_CENTOS_5},
-                           {"centos6-x86", "centos6", GUESS_VERSION_CENTOS_6},
-                           {"centos6-x64", "centos6-64", GUESS_VERSION_CENTOS_6},
-                           {"centos7", "centos7-64", GUESS_VERSION_CENTOS_7},
-                           {"centos7-last-perl", "centos7-64", GUESS_VERSION_CENTOS_7},
-                           {"centos7-minimal", "centos7-64", GUESS_VERSION_CENTOS_7_MINIMAL},
-                           {"centos7-x86", nullptr},
-                           {"centos8", "centos8-64", GUESS_VERSION_CENTOS_8},
-                           {"centos8-stream", "centos8-64", GUESS_VERSION_CENTOS_8_STREAM},
-                           {"centos8-x86", nullptr},
-                           {"centos8-aarch64", nullptr},
-                           {"centos-no-key", "centos-64"}};
-  ExpectGuesses("redhat", rows);
-}
-
-TEST(GuessRedHat, OracleAndAsianux) {
-  const GuessRow rows[] = {{"asianux3", "asianux3-64"},
-                           {"asianux3-sp", "asianux3"},
-                           {"asianux4", "asianux4-64"},
-                           {"asianux7", "asianux7-64"},
-                           {"asianux7-live-named", "asianux7-64", GUESS_VERSION_ASIANUX_7_LIVE},
-                           {"asianux7-live", "asianux7-64", GUESS_VERSION_ASIANUX_7_LIVE},
-                           {"oracle4", "oraclelinux"},
-                           {"oracle5", "oraclelinux-64"},
-                           {"oracle6", "oraclelinux6"},
-                           {"oracle7", "oraclelinux7-64"},
-                           // No fall-back on the older Oracle rows.
-                           {"oracle7-x86", nullptr},
-                           {"oracle8", "oraclelinux8-64"}};
-  ExpectGuesses("redhat", rows);
-}
-
-TEST(GuessRedHat, Fedora) {
+TEST(GuessRedHat, MasteredMedia) {
   const GuessRow rows[] = {
+      // Red Hat Enterprise Linux.
+      {"rhel3-x86", "rhel3"},
+      {"rhel3-x64", "rhel3-64"},
+      {"rhel4-x64", "rhel4-64"},
+      {"rhel4-x86", "rhel4"},
+      {"rhel5-server-x64", "rhel5-64"},
+      {"rhel5-client-x86", "rhel5"},
+      {"rhel6-x64", "rhel6-64"},
+      {"rhel6-x86", "rhel6"},
+      {"rhel7-server-name", "rhel7-64", GUESS_VERSION_RHEL_SERVER},
+      {"rhel7-workstation-name", "rhel7-64", GUESS_VERSION_RHEL_WORKSTATION},
+      {"rhel7-client-name", "rhel7-64", GUESS_VERSION_RHEL_CLIENT},
+      // Workstation wins over Server, Server over Client.
+      {"rhel7-server-workstation", "rhel7-64", GUESS_VERSION_RHEL_WORKSTATION},
+      {"rhel7-client", "rhel7-64", GUESS_VERSION_RHEL_CLIENT},
+      {"rhel7-server", "rhel7", GUESS_VERSION_RHEL_SERVER},
+      {"rhel7-no-treeinfo", nullptr},
+      {"rhel7-treeinfo-empty", nullptr},
+      // Without .discinfo the boot configuration tells RHEL 7; the CentOS
+      // key generation still gives the class.
+      {"rhel7-boot-x64", "rhel7-64", GUESS_VERSION_CENTOS_7_MINIMAL},
+      {"rhel7-boot-x86", "rhel7"},
+      {"rhel7-boot-noarch", nullptr},
+      // RHEL 8 has one identifier whatever the architecture line says.
+      {"rhel8-x64", "rhel8-64"},
+      {"rhel8-x86", "rhel8-64"},
+      {"rhel21", "rhel2", 0, true},
+      {"rhel3-notes", nullptr},
+      {"redhat9", "redhat", GUESS_VERSION_CENTOS_3},
+      {"notes-blank", nullptr},
+      // CentOS.
+      {"centos3-x86", "centos", GUESS_VERSION_CENTOS_3},
+      {"centos4-x64", "centos-64", GUESS_VERSION_CENTOS_4},
+      // The key comes before the release-name rows.
+      {"centos5-rhel-name", "centos-64", GUESS_VERSION_CENTOS_5},
+      {"centos6-x86", "centos6", GUESS_VERSION_CENTOS_6},
+      {"centos6-x64", "centos6-64", GUESS_VERSION_CENTOS_6},
+      {"centos7", "centos7-64", GUESS_VERSION_CENTOS_7},
+      {"centos7-last-perl", "centos7-64", GUESS_VERSION_CENTOS_7},
+      {"centos7-minimal", "centos7-64", GUESS_VERSION_CENTOS_7_MINIMAL},
+      {"centos7-x86", nullptr},
+      {"centos8", "centos8-64", GUESS_VERSION_CENTOS_8},
+      {"centos8-stream", "centos8-64", GUESS_VERSION_CENTOS_8_STREAM},
+      {"centos8-x86", nullptr},
+      {"centos8-aarch64", nullptr},
+      {"centos-no-key", "centos-64"},
+      // Oracle Linux and Asianux.
+      {"asianux3", "asianux3-64"},
+      {"asianux3-sp", "asianux3"},
+      {"asianux4", "asianux4-64"},
+      {"asianux7", "asianux7-64"},
+      {"asianux7-live-named", "asianux7-64", GUESS_VERSION_ASIANUX_7_LIVE},
+      {"asianux7-live", "asianux7-64", GUESS_VERSION_ASIANUX_7_LIVE},
+      {"oracle4", "oraclelinux"},
+      {"oracle5", "oraclelinux-64"},
+      {"oracle6", "oraclelinux6"},
+      {"oracle7", "oraclelinux7-64"},
+      // No fall-back on the older Oracle rows.
+      {"oracle7-x86", nullptr},
+      {"oracle8", "oraclelinux8-64"},
+      // Fedora.
       {"fedora-core6", "Fedora"},
       {"fedora7", "Fedora-64"},
       {"fedora8", "Fedora", GUESS_VERSION_FEDORA_8},
@@ -96,22 +88,18 @@ TEST(GuessRedHat, Fedora) {
       {"fedora-bare", "Fedora-64"},
       {"fedora-live-x64", "Fedora-64", GUESS_VERSION_FEDORA_LIVE},
       {"fedora-live-aa64", "arm-Fedora-64", GUESS_VERSION_FEDORA_LIVE, true},
-      {"fedora-live", "Fedora", GUESS_VERSION_FEDORA_LIVE}};
-  ExpectGuesses("redhat", rows);
-}
-
-// Media this recogniser does not know, and broken marker files: never more
-// than "not recognised". .discinfo lines are compared as they stand, so a
-// CR LF file names no known architecture.
-TEST(GuessRedHat, Unknown) {
-  const GuessRow rows[] = {{"ppc64", nullptr},
-                           {"unknown-release", nullptr},
-                           {"discinfo-empty", nullptr},
-                           {"discinfo-binary", nullptr},
-                           {"discinfo-one-line", nullptr},
-                           {"discinfo-crlf", nullptr},
-                           {"discinfo-two-lines", nullptr},
-                           {"discinfo-huge", "centos8-64", GUESS_VERSION_CENTOS_8_STREAM}};
+      {"fedora-live", "Fedora", GUESS_VERSION_FEDORA_LIVE},
+      // Media this recogniser does not know, and broken marker files: never more
+      // than "not recognised". .discinfo lines are compared as they stand, so a
+      // CR LF file names no known architecture.
+      {"ppc64", nullptr},
+      {"unknown-release", nullptr},
+      {"discinfo-empty", nullptr},
+      {"discinfo-binary", nullptr},
+      {"discinfo-one-line", nullptr},
+      {"discinfo-crlf", nullptr},
+      {"discinfo-two-lines", nullptr},
+      {"discinfo-huge", "centos8-64", GUESS_VERSION_CENTOS_8_STREAM}};
   ExpectGuesses("redhat", rows);
 }
 

@@ -10,19 +10,12 @@ struct MediumCase {
   const char *language;
 };
 
-// Text-mode and Windows 9x media leave the short language empty; the
-// default language goes into a result nothing recognises.
-template <size_t N>
-void ExpectDetected(const MediumCase (&cases)[N]) {
-  for (const MediumCase &c : cases) {
-    std::string image = std::string("windows-legacy/") + c.image;
-    tvxtest::ExpectGuess({image.c_str(), c.guestOS}, {c.language, c.guestOS ? "" : nullptr});
-  }
-}
-
 // Text-mode setup media: the product name in TXTSETUP.SIF decides, the
-// Localization of PRODSPEC.INI (I386, else AMD64) gives the language.
-TEST(GuessWindowsNT, RecognisesSetupMediaEndToEnd) {
+// Localization of PRODSPEC.INI (I386, else AMD64) gives the language. Windows
+// 9x media: the legacy directories are probed in order and the last one
+// present wins. Both leave the short language empty; the default language
+// goes into a result nothing recognises.
+TEST(GuessWindowsLegacy, RecognisesSetupMediaEndToEnd) {
   const MediumCase cases[] = {
       {"win2000pro", "win2000Pro", "English"},      // plain level-1 names
       {"win2000srv", "win2000Serv", "French"},      // srv_id only
@@ -39,26 +32,16 @@ TEST(GuessWindowsNT, RecognisesSetupMediaEndToEnd) {
       {"win2003ent-x64", "winNetEnterprise-64", "English"},  // read as UDF
       {"nt4wks", "winNT", ""},                               // value on the line after "wks_id ="
       {"nt4srv", "winNT", ""},
-  };
-  ExpectDetected(cases);
-}
-
-TEST(GuessWindowsNT, IgnoresMediaWithoutAKnownProduct) {
-  const MediumCase cases[] = {
       {"lowercase-product", nullptr, "en-US"},  // table rows match with case
       {"no-product-id", nullptr, "en-US"},
-  };
-  ExpectDetected(cases);
-}
-
-// The legacy directories are probed in order and the last one present wins.
-TEST(GuessWindowsLegacy, RecognisesSetupDirectories) {
-  const MediumCase cases[] = {
       {"win95", "win95", ""},
       {"win98", "win98", ""},  // lower-case Rock Ridge name
       {"winme", "winMe", ""},  // WIN9X and WIN95
   };
-  ExpectDetected(cases);
+  for (const MediumCase &c : cases) {
+    std::string image = std::string("windows-legacy/") + c.image;
+    tvxtest::ExpectGuess({image.c_str(), c.guestOS}, {c.language, c.guestOS ? "" : nullptr});
+  }
 }
 
 TEST(GuessParseKeyValue, ReadsValuesAsSetupFilesWriteThem) {

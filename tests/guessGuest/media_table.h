@@ -5,9 +5,11 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <cstdint>
 #include <cstring>
 #include <string>
+#include <string_view>
 
 #include "lib/guessGuest/guess_internal.h"
 #include "platform/guestos.h"
@@ -36,8 +38,11 @@ struct GuessExtras {
   const char *language = "en-US";
   const char *languageShort = nullptr;  // null: `language` cut to its field
   const char *languages = "";
-  const char *editions = "";
+  const char *editions = "";  // the whole list, or only its first name (editionCount)
   const char *displayName = "";
+  // Most edition lists are fixed texts of the recogniser; what can go wrong is
+  // the choice of list, which its first name and its length tell apart.
+  int editionCount = -1;  // -1: `editions` is the whole list
 };
 
 inline std::string MediaPath(const std::string &image) { return MediaDir() + "/" + image + ".iso"; }
@@ -61,7 +66,13 @@ inline void ExpectGuess(const GuessRow &row, const GuessExtras &x = {}) {
   EXPECT_EQ(std::string(r.languageShort),
             x.languageShort != nullptr ? x.languageShort : std::string(x.language).substr(0, 31));
   EXPECT_STREQ(r.languages, x.languages);
-  EXPECT_STREQ(r.editions, x.editions);
+  if (x.editionCount < 0) {
+    EXPECT_STREQ(r.editions, x.editions);
+  } else {
+    std::string_view list(r.editions);
+    EXPECT_EQ(list.substr(0, list.find('?')), x.editions);
+    EXPECT_EQ(std::count(list.begin(), list.end(), '?'), x.editionCount) << list;
+  }
   EXPECT_STREQ(r.displayName, x.displayName);
 }
 

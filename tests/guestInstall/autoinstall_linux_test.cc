@@ -14,6 +14,7 @@
 #include <string>
 #include <vector>
 
+#include "lib/guestInstall/autoinstall_internal.h"
 #include "lib/guestInstall/autoinstall_linux_internal.h"
 #include "support/log_capture.h"
 #include "support/run_argv.h"
@@ -24,6 +25,7 @@
 namespace {
 
 namespace fs = std::filesystem;
+using tvx::autoinstall::AutoInstallGetLinuxKind;
 using tvx::autoinstall::linuxAnswerFileTable;
 
 constexpr char kFn[] = "AutoInstall_PrepareAnswerFileEx_Linux: ";
@@ -98,16 +100,9 @@ class LinuxAnswers : public ::testing::Test {
     p.ok = AutoInstall_PrepareAnswerFileEx_Linux(guestOS, version, out.c_str(), user,
                                                  fullName.c_str(), password.c_str(),
                                                  rootPassword.c_str(), key, powerOff, 0, nvme);
-    p.path = tvx::autoinstall::LinuxAnswerFilePath(KindOf(guestOS), out.c_str());
+    p.path = tvx::autoinstall::LinuxAnswerFilePath(AutoInstallGetLinuxKind(guestOS), out.c_str());
     p.text = p.ok ? tvxtest::ReadFileOrDie(p.path) : "";
     return p;
-  }
-  static AutoInstallLinuxKind KindOf(const std::string &g) {
-    if (g.rfind("ubuntu", 0) == 0) return AUTOINSTALL_LINUX_UBUNTU;
-    if (g.rfind("sles10", 0) == 0) return AUTOINSTALL_LINUX_SLES10;
-    if (g.rfind("sles", 0) == 0 || g.rfind("opensuse", 0) == 0) return AUTOINSTALL_LINUX_SUSE;
-    if (g.rfind("mandriva", 0) == 0) return AUTOINSTALL_LINUX_MANDRIVA;
-    return AUTOINSTALL_LINUX_REDHAT;
   }
   tvxtest::TempDir dir_;
 };

@@ -1,6 +1,10 @@
-# Sourced by the command-line tests. Every check prints "ok: WHAT" or
+# Sourced by the command-line tests: the tool, a scratch directory $tmp that
+# goes when the test ends, and the checks. Every check prints "ok: WHAT" or
 # "FAIL: WHAT" and counts failures in $fails; a test ends with
 # `exit $((fails > 0))`.
+tool=${TVX_TOOL:?}
+tmp=$(mktemp -d)
+trap 'rm -rf "$tmp"' EXIT
 fails=0
 check() {  # check WHAT COMMAND...: the command must succeed
   local what=$1; shift
@@ -18,4 +22,20 @@ check_exit() {  # check_exit WHAT EXPECTED_STATUS ACTUAL_STATUS [OUTPUT PATTERN]
 }
 json() {  # json JSON EXPRESSION: j[...] of the parsed JSON, as JSON text
   /usr/bin/python3 -c 'import json,sys; j=json.loads(sys.argv[1]); print(json.dumps(eval(sys.argv[2])))' "$1" "$2"
+}
+need_command() {  # need_command WORDS...: skip the test when this tool lacks the command
+  "$tool" "$@" --help >/dev/null 2>&1 && return
+  echo "skip: this tool has no '$*' command"
+  exit 0
+}
+need_pki() {  # makes the test PKI in $certs, the build's own certificate directory, or skips
+  certs=${TVX_CERT_DIR:-}
+  if [ -z "$certs" ]; then
+    echo "skip: the build trusts a certificate directory outside its tree"
+    exit $((fails > 0))
+  fi
+  "${TVX_SOURCE_DIR:?}/scripts/make-test-pki" "$certs" || { echo "FAIL: make-test-pki"; exit 1; }
+}
+usable() {  # usable IMAGE: mastered, and recognised by this build
+  [ -e "$1" ] && "$tool" detect "$1" >/dev/null 2>&1
 }
