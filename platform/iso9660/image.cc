@@ -11,6 +11,7 @@
 
 #include "tvx_iso9660.h"
 #include "platform/ascii.h"
+#include "platform/endian.h"
 #include "platform/iso9660/ecma119.h"
 #include "platform/iso9660/image.h"
 #include "platform/iso9660/names.h"
@@ -116,24 +117,27 @@ int Image::Load(const Extent &where, Listing *out) {
   bool continuing = false;  // the previous record announced another extent
   bool skipping = false;    // ... of an entry that is not listed
   std::string_view previousId;
-  size_t pos = 0;
-  while (pos < buf.size()) {
-    size_t len = buf[pos];
-    size_t blockEnd = std::min(buf.size(), (pos / kBlockSize + 1) * kBlockSize);
-    if (len == 0) {
-      pos = blockEnd;
+  // Records never cross a block: each block is a cursor of its own, and a
+  // zero length byte ends the block's records.
+  ByteCursor blocks(buf.data(), buf.size());
+  ByteCursor records;
+  while (!records.empty() ||
+         (!blocks.empty() &&
+          blocks.GetSub(std::min<size_t>(kBlockSize, blocks.remaining()), &records))) {
+    uint64_t at = where.offset + (buf.size() - blocks.remaining() - records.remaining());
+    const uint8_t *r;
+    if (!records.Peek(1, &r) || r[0] == 0) {
+      records = ByteCursor();  // the rest of the block is padding
       continue;
     }
-    const uint8_t *r = buf.data() + pos;
-    size_t nameLen = len > kDrNameLength ? r[kDrNameLength] : 0;
+    size_t len = r[0];
     uint32_t block, size;
-    if (len < kDrName + 1 || len > blockEnd - pos || kDrName + nameLen > len ||
+    if (len < kDrName + 1 || !records.GetBytes(len, &r) || kDrName + r[kDrNameLength] > len ||
         !Both32(r + kDrExtent, &block) || !Both32(r + kDrDataLength, &size)) {
-      Log("Iso9660: invalid directory record at byte %llu\n",
-          static_cast<unsigned long long>(where.offset + pos));
+      Log("Iso9660: invalid directory record at byte %llu\n", static_cast<unsigned long long>(at));
       return ISO9660_ERR_CORRUPT;
     }
-    pos += len;
+    size_t nameLen = r[kDrNameLength];
     uint8_t flags = r[kDrFlags];
     std::string_view id(reinterpret_cast<const char *>(r + kDrName), nameLen);
     Extent data{(static_cast<uint64_t>(block) + r[kDrExtAttrLength]) * kBlockSize, size};
@@ -142,7 +146,7 @@ int Image::Load(const Extent &where, Listing *out) {
     if (continuing) {
       if (id != previousId || (flags & kFlagDirectory)) {
         Log("Iso9660: broken multi-extent file at byte %llu\n",
-            static_cast<unsigned long long>(where.offset + pos - len));
+            static_cast<unsigned long long>(at));
         return ISO9660_ERR_CORRUPT;
       }
       if (!skipping) {

@@ -9,6 +9,7 @@
 // than leave it out unseen.
 #include <algorithm>
 
+#include "platform/endian.h"
 #include "platform/log.h"
 #include "platform/udf/udf_internal.h"
 
@@ -45,25 +46,27 @@ Status ReadDirectory(Volume *vol, const Node &node, std::vector<DirEntry> *out) 
   Status st = vol->ReadNode(node, 0, data.data(), size);
   if (st != Status::kOk) return st;
 
-  size_t pos = 0;
-  while (pos < size) {
-    const uint8_t *f = data.data() + pos;
-    size_t left = size - pos;
+  ByteCursor rest(data.data(), size);
+  while (!rest.empty()) {
+    size_t pos = size - rest.remaining();
     // Some writers pad the last block of a directory with zeros.
-    if (AllZero(f, left)) break;
-    if (left < kFidImplUse ||
-        CheckTag(f, left, kTagFileIdentifier, UINT32_MAX) != Status::kOk) {
+    if (AllZero(rest.data(), rest.remaining())) break;
+    const uint8_t *f;
+    if (!rest.Peek(kFidImplUse, &f) ||
+        CheckTag(f, rest.remaining(), kTagFileIdentifier, UINT32_MAX) != Status::kOk) {
       Log("UDF: bad file identifier descriptor at offset %zu of a directory\n", pos);
       return Status::kCorrupt;
     }
     size_t nameLen = f[kFidNameLength];
     size_t implLen = LoadLe16(f + kFidImplUseLength);
     size_t used = kFidImplUse + implLen + nameLen;
-    if (used > left) {
+    ByteCursor fid;
+    if (!rest.GetSub(used, &fid)) {
       Log("UDF: file identifier descriptor at offset %zu of a directory is cut short\n", pos);
       return Status::kCorrupt;
     }
-    pos += std::min(left, (used + 3) & ~size_t{3});
+    // Descriptors start on four-byte boundaries; the last may end unpadded.
+    rest.Skip(std::min(((used + 3) & ~size_t{3}) - used, rest.remaining()));
     uint8_t chars = f[kFidCharacteristics];
     if (chars & (kFidDeleted | kFidParent)) continue;
     DirEntry e;
