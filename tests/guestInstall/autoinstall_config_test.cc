@@ -59,43 +59,26 @@ TEST(AutoInstallSupport, PerFamily) {
     uint32_t version;
     Bool supported;
   } cases[] = {
+      // One accepted and one refused row per rule; the refused-version lists
+      // themselves are constants.
       {nullptr, GUESS_VERSION_CENTOS_7, FALSE},
-      // Red Hat family
-      {"redhat", GUESS_VERSION_UNKNOWN, FALSE},
-      {"redhat7", GUESS_VERSION_RHEL_SERVER, TRUE},
+      {"redhat", GUESS_VERSION_UNKNOWN, FALSE},  // the bare name is exact
       {"rhel8-64", GUESS_VERSION_UNKNOWN, TRUE},
-      {"centos7-64", GUESS_VERSION_CENTOS_7, TRUE},
       {"centos7-64", GUESS_VERSION_CENTOS_7_MINIMAL, FALSE},
-      {"centos8-64", GUESS_VERSION_CENTOS_8_STREAM, FALSE},
-      {"fedora", GUESS_VERSION_FEDORA_8, FALSE},
-      {"fedora-64", GUESS_VERSION_FEDORA_LIVE, FALSE},
-      {"fedora-64", GUESS_VERSION_FEDORA_29_OR_HIGHER, TRUE},
       {"RHEL8-64", GUESS_VERSION_UNKNOWN, FALSE},  // Linux prefixes are case-sensitive
-      // Ubuntu
       {"ubuntu-64", GUESS_VERSION_UNKNOWN, FALSE},
-      {"ubuntu", GUESS_VERSION_UBUNTU_SERVER_140402, FALSE},
       {"ubuntu", GUESS_VERSION_UBUNTU_704_OR_LOWER, FALSE},
       {"ubuntu", GUESS_VERSION_UBUNTU_710_OR_HIGHER, TRUE},
-      {"ubuntu-64", GUESS_VERSION_UBUNTU_2010_OR_HIGHER, TRUE},
-      // SUSE
       {"sles10", GUESS_VERSION_UNKNOWN, TRUE},
       {"sles10-64", GUESS_VERSION_SLES_10_SP2_OR_LOWER, FALSE},
-      {"opensuse-64", GUESS_VERSION_OPENSUSE_12, TRUE},
-      {"opensuse-64", GUESS_VERSION_OPENSUSE_13_1, FALSE},
       {"sles12-64", GUESS_VERSION_OPENSUSE_13_2_OR_HIGHER, FALSE},
-      // never offered
-      {"mandriva", GUESS_VERSION_MANDRIVA_2008_0, FALSE},
+      {"mandriva", GUESS_VERSION_MANDRIVA_2008_0, FALSE},  // never offered
       {"debian10-64", GUESS_VERSION_UNKNOWN, FALSE},
-      // Windows
       {"winXPPro", GUESS_VERSION_UNKNOWN, TRUE},
-      {"longhorn-64", GUESS_VERSION_UNKNOWN, TRUE},
       {"windows9-64", GUESS_VERSION_WINDOWS_10_TRIAL, TRUE},
       {"windows9-64", GUESS_VERSION_WINDOWS_10_ESD, FALSE},
-      {"windows8", GUESS_VERSION_WINDOWS_8_TRIAL, FALSE},
-      {"windows8srv-64", GUESS_VERSION_WINDOWS_SERVER_2012_R2_TRIAL, FALSE},
       {"windows2019srv-64", GUESS_VERSION_UNKNOWN, TRUE},
       {"win2000Pro", GUESS_VERSION_UNKNOWN, FALSE},
-      {"winNT", GUESS_VERSION_UNKNOWN, FALSE},
   };
   for (const auto &c : cases) {
     GuessResult g = Guess(c.guestOS, c.version);
@@ -109,14 +92,10 @@ TEST(AutoInstallLinuxKind, Prefixes) {
     const char *guestOS;
     AutoInstallLinuxKind kind;
   } cases[] = {
-      {"redhat", AUTOINSTALL_LINUX_REDHAT},     {"rhel7-64", AUTOINSTALL_LINUX_REDHAT},
-      {"asianux4", AUTOINSTALL_LINUX_REDHAT},   {"fedora-64", AUTOINSTALL_LINUX_REDHAT},
-      {"centos-64", AUTOINSTALL_LINUX_REDHAT},  {"sles10-64", AUTOINSTALL_LINUX_SLES10},
-      {"sles11", AUTOINSTALL_LINUX_SUSE},       {"sles12-64", AUTOINSTALL_LINUX_SUSE},
-      {"opensuse", AUTOINSTALL_LINUX_SUSE},     {"ubuntu-64", AUTOINSTALL_LINUX_UBUNTU},
+      {"rhel7-64", AUTOINSTALL_LINUX_REDHAT},   {"sles10-64", AUTOINSTALL_LINUX_SLES10},
+      {"sles11", AUTOINSTALL_LINUX_SUSE},       {"ubuntu-64", AUTOINSTALL_LINUX_UBUNTU},
       {"mandriva", AUTOINSTALL_LINUX_MANDRIVA}, {"sles15-64", AUTOINSTALL_LINUX_NONE},
-      {"Ubuntu", AUTOINSTALL_LINUX_NONE},       {"debian10", AUTOINSTALL_LINUX_NONE},
-      {nullptr, AUTOINSTALL_LINUX_NONE},
+      {"Ubuntu", AUTOINSTALL_LINUX_NONE},       {nullptr, AUTOINSTALL_LINUX_NONE},
   };
   for (const auto &c : cases) {
     EXPECT_EQ(c.kind, AutoInstallGetLinuxKind(c.guestOS)) << (c.guestOS ? c.guestOS : "(null)");

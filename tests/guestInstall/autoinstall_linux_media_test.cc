@@ -74,9 +74,7 @@ TEST(MakeFloppyImgLinux, AnswerFileOnTheGuestsFloppy) {
     EXPECT_EQ(data, answer) << label;
     EXPECT_EQ(tvxtest::MtoolsNames(image).count("driver.img"), c.fromTemplate ? 1u : 0u) << label;
   }
-  EXPECT_FALSE(AutoInstall_NeedsFloppy_Linux("sles15-64"));
   EXPECT_FALSE(AutoInstall_NeedsFloppy_Linux(nullptr));
-  EXPECT_TRUE(AutoInstall_NeedsFloppy_Linux("sles10-64"));
 }
 
 }  // namespace

@@ -3,7 +3,6 @@
 
 #include <cstdlib>
 #include <cstring>
-#include <string>
 
 #include "lib/guestInstall/autoinstall_internal.h"
 #include "tvx_autoinstall.h"
@@ -57,10 +56,7 @@ TEST(AutoInstallValidate, TextsPerFamilyAndKind) {
     const char *message;  // null: the slot stays untouched
   } cases[] = {
       {"linux", "rhel8-64", "9lives", kShortName, AUTOINSTALL_TEXT_OK, nullptr},
-      {"linux", "rhel8-64", "-dash", kShortName, AUTOINSTALL_TEXT_OK, nullptr},
       {"linux", "rhel8-64", "Bob", kShortName, AUTOINSTALL_TEXT_BAD_LINUX_USERNAME, kLinuxUserMsg},
-      {"linux", "sles12-64", "jo_e", kShortName, AUTOINSTALL_TEXT_BAD_LINUX_USERNAME,
-       kLinuxUserMsg},
       {"linux", "ubuntu-64", "9lives", kShortName, AUTOINSTALL_TEXT_BAD_UBUNTU_USERNAME,
        kUbuntuUserMsg},
       {"linux", "ubuntu-64", "", kShortName, AUTOINSTALL_TEXT_BAD_UBUNTU_USERNAME,
@@ -69,8 +65,6 @@ TEST(AutoInstallValidate, TextsPerFamilyAndKind) {
       {"linux", "ubuntu-64", "bOb", kShortName, AUTOINSTALL_TEXT_BAD_LINUX_USERNAME,
        kLinuxUserMsg},
       {"linux", "rhel8-64", "Doe, John", kName, AUTOINSTALL_TEXT_BAD_LINUX_NAME, kLinuxNameMsg},
-      {"linux", "rhel8-64", "a:b", kName, AUTOINSTALL_TEXT_BAD_LINUX_NAME, kLinuxNameMsg},
-      {"linux", "rhel8-64", "C:\\x", kName, AUTOINSTALL_TEXT_BAD_LINUX_NAME, kLinuxNameMsg},
       {"linux", "rhel8-64", "say \"hi\"", kName, AUTOINSTALL_TEXT_BAD_LINUX_NAME, kLinuxNameMsg},
       {"linux", "rhel8-64", "x]]>y", kName, AUTOINSTALL_TEXT_BAD_GECOS_SUBSTRING, kGecosMsg},
       {"linux", "rhel8-64", "x]]>y,", kName, AUTOINSTALL_TEXT_BAD_LINUX_NAME, kLinuxNameMsg},
@@ -82,7 +76,7 @@ TEST(AutoInstallValidate, TextsPerFamilyAndKind) {
        kWindowsNameMsg},
       {"windows", "winXPPro", "Doe, John", kPassword, AUTOINSTALL_TEXT_OK, nullptr},
       {"windows", "winXPPro", "Bob", kShortName, AUTOINSTALL_TEXT_OK, nullptr},
-      {"windows", "windows9-64", "Jane Doe", kName, AUTOINSTALL_TEXT_OK, nullptr},
+      {"windows", "windows9-64", "J.-Doe_(x)!@#$%^&'~`{}", kName, AUTOINSTALL_TEXT_OK, nullptr},
   };
   for (const auto &c : cases) {
     GuessResult g = Guess(c.guestOS);
@@ -97,25 +91,6 @@ TEST(AutoInstallValidate, TextsPerFamilyAndKind) {
     // Without a slot the verdict is the same.
     EXPECT_EQ(c.error, Validate(c.family, &g, c.text, c.kind, nullptr)) << c.text;
   }
-}
-
-TEST(AutoInstallValidate, EveryForbiddenWindowsCharacter) {
-  for (const char *p = "/\\[]\":;|<>+=,?*"; *p != '\0'; ++p) {
-    std::string name = std::string("User") + *p + "Name";
-    EXPECT_EQ(AUTOINSTALL_TEXT_BAD_WINDOWS_NAME,
-              AutoInstallValidateWindowsText(nullptr, name.c_str(), AUTOINSTALL_TEXT_NAME, nullptr))
-        << name;
-  }
-  EXPECT_EQ(AUTOINSTALL_TEXT_OK,
-            AutoInstallValidateWindowsText(nullptr, "J.-Doe_(x)!@#$%^&'~`{}", AUTOINSTALL_TEXT_NAME,
-                                           nullptr));
-}
-
-TEST(AutoInstallValidate, OtherKindsAreAccepted) {
-  GuessResult g = Guess("ubuntu-64");
-  EXPECT_EQ(AUTOINSTALL_TEXT_OK, AutoInstallValidateLinuxText(&g, "]]>:", 3, nullptr));
-  EXPECT_EQ(AUTOINSTALL_TEXT_OK, AutoInstallValidateLinuxText(&g, "]]>:", -1, nullptr));
-  EXPECT_EQ(AUTOINSTALL_TEXT_OK, AutoInstallValidateWindowsText(&g, ",", 7, nullptr));
 }
 
 TEST(AutoInstallValidateDeathTest, UnknownFamilyStops) {
