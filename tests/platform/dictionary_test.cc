@@ -65,7 +65,6 @@ TEST(Dictionary, ParsesEntriesOrNamesTheMalformedLine) {
       {"\xEF\xBB\xBF" "bom = 1", {{"bom", "1"}}},
       {"esc = \"q\\\" b\\\\ n\\n t\\t h\\x41\"", {{"esc", "q\" b\\ n\n t\t hA"}}},
       {"a.version = 1\nA.VERSION = 2\n", {{"a.version", "1"}, {"A.VERSION", "2"}}},
-      {"arm-windows9-64 = \"windows.iso\"", {{"arm-windows9-64", "windows.iso"}}},
       {"", {}},
       {"ok = 1\nno equals here\n", {}, "line 2: \"=\" expected after \"no\""},
       {"ok = 1\n\n# c\nname\n", {}, "line 4: \"=\" expected after \"name\""},
@@ -192,19 +191,6 @@ TEST(Dictionary, StringToBool) {
     EXPECT_EQ(Dictionary_StringToBool(c.text, FALSE), c.whenDefaultFalse) << label;
     EXPECT_EQ(Dictionary_StringToBool(c.text, TRUE), c.whenDefaultTrue) << label;
   }
-}
-
-TEST(MsgList, JoinsAndLogsMessages) {
-  MsgList *list = nullptr;
-  EXPECT_EQ(Take(MsgList_ToEnglishString(list)), "");
-  MsgList_Append(&list, "@&!*@*@(msg.t.one)line %u: first\n", 3u);
-  MsgList_Append(&list, "second");
-  MsgList_Append(nullptr, "dropped");
-  EXPECT_EQ(Take(MsgList_ToEnglishString(list)), "line 3: first; second");
-  tvxtest::LogCapture cap;
-  MsgList_Log(list);
-  EXPECT_EQ(cap.Lines(), (std::vector<std::string>{"line 3: first\n", "second\n"}));
-  MsgList_Free(list);
 }
 
 }  // namespace
