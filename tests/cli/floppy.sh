@@ -32,12 +32,9 @@ sizes = {e["name"]: e["size"] for e in o["entries"]}
 assert sizes == {"Driver Notes.txt": 513, "empty": 0}, sizes
 assert o["freeBytes"] == (2847 - 2) * 512, o["freeBytes"]' "$tmp/json"
 
-"$tool" floppy format "$img" >/dev/null 2>&1
-check "format refuses an existing image without --force" test $? -eq 1
-"$tool" floppy ls "$tmp/big.bin" >/dev/null 2>&1
-check "ls of a non-FAT file: exit 2" test $? -eq 2
-"$tool" floppy add "$img" >/dev/null 2>&1
-check "add without a file: exit 64" test $? -eq 64
+check "format refuses an existing image without --force" status 1 "$tool" floppy format "$img"
+check "ls of a non-FAT file: exit 2" status 2 "$tool" floppy ls "$tmp/big.bin"
+check "add without a file: exit 64" status 64 "$tool" floppy add "$img"
 
 winxp=$media/windows-legacy/winxppro.iso
 if [ -e "$winxp" ]; then
@@ -55,9 +52,8 @@ if [ -e "$winxp" ]; then
   mdir -b -i "$tmp/xp/autoinst.flp" ::/ >"$tmp/names"
   check "mtools lists answer files, helpers and drivers" test "$(sort "$tmp/names" | tr '\n' ' ')" = \
     "::/autoun~0.xml ::/lsi_sas.sys ::/storePwd.exe ::/storePwd.ini ::/txtsetup.oem ::/unattend.cmd ::/winnt.sif "
-  "$tool" unattended windows --sif a --xml b --image-name c --full-name d --out "$tmp/n" \
-    --floppy "$winxp" >/dev/null 2>&1
-  check "--floppy without --resource-dir: exit 64" test $? -eq 64
+  check "--floppy without --resource-dir: exit 64" status 64 "$tool" unattended windows --sif a \
+    --xml b --image-name c --full-name d --out "$tmp/n" --floppy "$winxp"
 else
   echo "skip: $winxp not mastered"
 fi

@@ -62,8 +62,8 @@ if usable "$debian"; then
 fi
 check "failures leave nothing in --out" test ! -e "$tmp/f/deb"
 check "no staging directory left" test -z "$(find "$tmp" -name '*.staging-*')"
-"$tool" unattended linux --full-name x --password p --out "$tmp/u" "$centos" >/dev/null 2>&1
-check "missing --user: exit 64" test $? -eq 64
+check "missing --user: exit 64" status 64 "$tool" unattended linux --full-name x --password p \
+  --out "$tmp/u" "$centos"
 
 # crypt: a random salt and clamped rounds cross-checked with openssl (the
 # published vectors are the library's test).

@@ -22,8 +22,8 @@ master "$dvd" "$tmp/centos.iso"
 
 "$tool" unattended scan --out "$tmp/scan-iso" "$tmp/centos.iso" >"$tmp/out" 2>&1
 check "scan of the CentOS image: exit 0" test $? -eq 0
-"$tool" unattended scan --guest-os centos7-64 --out "$tmp/scan-tree" "$dvd" >/dev/null 2>&1
-check "scan of the unpacked tree: exit 0" test $? -eq 0
+check "scan of the unpacked tree: exit 0" \
+  status 0 "$tool" unattended scan --guest-os centos7-64 --out "$tmp/scan-tree" "$dvd"
 for f in vmlinuz initrd.img isolinux.bin ldlinux.c32; do
   check "image scan: $f byte-identical" cmp -s "$dvd/isolinux/$f" "$tmp/scan-iso/isolinux/$f"
   check "tree scan: $f byte-identical" cmp -s "$dvd/isolinux/$f" "$tmp/scan-tree/isolinux/$f"
@@ -47,10 +47,10 @@ for arch in i386 x86_64; do
 done
 cp "$ldlinux" "$suse/boot/i386/loader/ldlinux.c32"
 master "$suse" "$tmp/suse.iso"
-"$tool" unattended scan --guest-os opensuse-64 --out "$tmp/suse-iso" "$tmp/suse.iso" >/dev/null 2>&1
-check "openSUSE image: exit 0" test $? -eq 0
-"$tool" unattended scan --guest-os opensuse-64 --out "$tmp/suse-tree" "$suse" >/dev/null 2>&1
-check "openSUSE tree: exit 0" test $? -eq 0
+check "openSUSE image: exit 0" \
+  status 0 "$tool" unattended scan --guest-os opensuse-64 --out "$tmp/suse-iso" "$tmp/suse.iso"
+check "openSUSE tree: exit 0" \
+  status 0 "$tool" unattended scan --guest-os opensuse-64 --out "$tmp/suse-tree" "$suse"
 for out in suse-iso suse-tree; do
   check "$out: kernel of the first loader directory" cmp -s "$suse/boot/i386/loader/linux" "$tmp/$out/isolinux/linux"
   check "$out: AutoYaST arguments" grep -q 'splash=silent  autoyast=floppy:///autoinst.xml' \
@@ -85,22 +85,18 @@ mkdir -p "$ubu/casper"
 printf 'K-casper' >"$ubu/casper/vmlinuz"
 printf 'I-casper' >"$ubu/casper/initrd"
 master "$ubu" "$tmp/ubuntu.iso"
-"$tool" unattended scan --guest-os ubuntu-64 --version GUESS_VERSION_UBUNTU_2010_OR_HIGHER \
-  --out "$tmp/ubu" "$tmp/ubuntu.iso" >/dev/null 2>&1
-check "Ubuntu 20.10 without --isolinux-bin: exit 1" test $? -eq 1
-"$tool" unattended scan --guest-os ubuntu-64 --version 10 --isolinux-bin "$bin" \
-  --out "$tmp/ubu" "$tmp/ubuntu.iso" >/dev/null 2>&1
-check "Ubuntu 20.10 with --isolinux-bin: exit 0" test $? -eq 0
+check "Ubuntu 20.10 without --isolinux-bin: exit 1" status 1 "$tool" unattended scan \
+  --guest-os ubuntu-64 --version GUESS_VERSION_UBUNTU_2010_OR_HIGHER --out "$tmp/ubu" "$tmp/ubuntu.iso"
+check "Ubuntu 20.10 with --isolinux-bin: exit 0" status 0 "$tool" unattended scan \
+  --guest-os ubuntu-64 --version 10 --isolinux-bin "$bin" --out "$tmp/ubu" "$tmp/ubuntu.iso"
 check "casper kernel under its base name" cmp -s "$ubu/casper/vmlinuz" "$tmp/ubu/isolinux/vmlinuz"
 check "ldlinux.c32 from the host" \
   cmp -s "$ldlinux" "$tmp/ubu/isolinux/ldlinux.c32"
 check "casper arguments" grep -q 'file=/cdrom/preseed/ubuntu.seed quiet splash ---  debian-installer' \
   "$tmp/ubu/isolinux/isolinux.cfg"
 
-"$tool" unattended scan "$tmp/centos.iso" >/dev/null 2>&1
-check "scan without --out: usage error 64" test $? -eq 64
-"$tool" unattended scan --out "$tmp/x" "$dvd" >/dev/null 2>&1
-check "tree without --guest-os: usage error 64" test $? -eq 64
+check "scan without --out: usage error 64" status 64 "$tool" unattended scan "$tmp/centos.iso"
+check "tree without --guest-os: usage error 64" status 64 "$tool" unattended scan --out "$tmp/x" "$dvd"
 
 # The whole road, when the answer-file command is built in.
 if "$tool" unattended linux --help >/dev/null 2>&1; then
@@ -115,9 +111,8 @@ if "$tool" unattended linux --help >/dev/null 2>&1; then
   check "ks.cfg at the root of autoinst.iso" \
     sh -c 'isoinfo -i "$1" -x "/KS.CFG;1" | grep -qF "rootpw --iscrypted \$5\$"' - "$media/autoinst.iso"
   check "the media directory holds autoinst.iso alone" test "$(ls -A "$media")" = autoinst.iso
-  "$tool" unattended linux "${answers[@]}" --out "$tmp/ans2" --media "$tmp/failed" \
-    --mkisofs /bin/false "$tmp/centos.iso" >/dev/null 2>&1
-  check "a failing mastering tool: exit 1" test $? -eq 1
+  check "a failing mastering tool: exit 1" status 1 "$tool" unattended linux "${answers[@]}" \
+    --out "$tmp/ans2" --media "$tmp/failed" --mkisofs /bin/false "$tmp/centos.iso"
   check "... and nothing left in the media directory" test -z "$(ls -A "$tmp/failed" 2>/dev/null)"
   check "... nor any staging directory" test -z "$(find "$tmp" -maxdepth 1 -name '.*staging*')"
   ubuiso=$tmp/ubu2004.iso

@@ -4,12 +4,6 @@ set -uo pipefail
 media=${TVX_MEDIA_DIR:?}/iso9660
 src=${TVX_SOURCE_DIR:?}
 . "$(dirname "$0")/lib/check.sh"
-status() {  # status EXPECTED COMMAND...: the command's exit status is EXPECTED
-  local want=$1
-  shift
-  "$@" >/dev/null 2>&1
-  [ $? -eq "$want" ]
-}
 
 first=$("$tool" media ls "$media/rr-joliet.iso" | head -1)
 check "ls names the reader and the volume" [ "$first" = 'iso9660 (rock ridge) volume "TVX_RR_JOLIET"' ]

@@ -25,16 +25,11 @@ check_exit "support on an unrecognised image" 1 $st "$out" "not offered"
 out=$("$tool" unattended support --json "$tmp/plain.iso"); st=$?
 check_exit "support --json: not supported" 1 $st "$(json "$out" 'j["supported"]')" false
 check_exit "support --json: no limits without a guest" 1 $st "$(json "$out" 'j["config"]')" null
-"$tool" unattended support "$tmp/text.iso" >/dev/null 2>&1
-check_exit "support on a non-image" 2 $?
+check "support on a non-image: exit 2" status 2 "$tool" unattended support "$tmp/text.iso"
 
 v() { "$tool" unattended validate "$@" "$tmp/plain.iso" 2>/dev/null; }
 out=$(v --family linux --kind short-name --text Bob); st=$?
 check_exit "linux short name with a capital" 5 $st "$out" "lowercase US English characters"
-out=$(v --family linux --kind name --text "Doe, John"); st=$?
-check_exit "linux full name with a comma" 1 $st "$out" "':\"\\,'"
-out=$(v --family linux --kind password --text "a]]>b"); st=$?
-check_exit "password holding ]]>" 3 $st "$out" "']]>' in a row"
 out=$(v --family windows --kind name --text "a|b"); st=$?
 check_exit "windows account name with |" 2 $st "$out" "must not contain the following characters"
 out=$(v --json --family linux --kind name --text "x]]>y"); st=$?
@@ -42,12 +37,11 @@ check_exit "validate --json names the error" 4 $st "$(json "$out" 'j["errorName"
   AUTOINSTALL_TEXT_BAD_GECOS_SUBSTRING
 out=$(v --json --family linux --kind name --text "Jane"); st=$?
 check_exit "validate --json: no message when accepted" 0 $st "$(json "$out" 'j["message"]')" null
-"$tool" unattended validate --kind name --text x "$tmp/text.iso" >/dev/null 2>&1
-check_exit "validate on a non-image" 66 $?
+check "validate on a non-image: exit 66" \
+  status 66 "$tool" unattended validate --kind name --text x "$tmp/text.iso"
 for bad in "--kind nickname --text x" "--family Windows --kind name --text x" "--kind name"; do
   # shellcheck disable=SC2086
-  "$tool" unattended validate $bad "$tmp/plain.iso" >/dev/null 2>&1
-  check_exit "validate usage: $bad" 64 $?
+  check "validate usage: $bad" status 64 "$tool" unattended validate $bad "$tmp/plain.iso"
 done
 "$tool" unattended frobnicate >/dev/null 2>&1; check_exit "unknown unattended subcommand" 64 $?
 "$tool" unattended support --help | grep -q "Exit status"; check_exit "support --help" 0 $?

@@ -86,9 +86,8 @@ if usable "$linux"; then
   check "linux image: nothing written" test -z "$(ls -A "$tmp/lx" 2>/dev/null)"
 fi
 
-"$tool" unattended windows --sif a --xml b --image-name c --full-name d --out "$tmp/n" \
-  "$tmp/no-such.iso" >/dev/null 2>&1
-check "unreadable image: exit 2" test $? -eq 2
+check "unreadable image: exit 2" status 2 "$tool" unattended windows --sif a --xml b \
+  --image-name c --full-name d --out "$tmp/n" "$tmp/no-such.iso"
 "$tool" unattended windows --xml b "$tmp/no-such.iso" >/dev/null 2>"$tmp/err"
 check "missing --sif: exit 64" test $? -eq 64
 check "missing --sif: says so" grep -q -- '--sif is required' "$tmp/err"

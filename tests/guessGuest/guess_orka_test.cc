@@ -33,9 +33,7 @@ TEST(GuessOrka, MasteredMedia) {
       // Orka installer: the boot menu title.
       {"orkai65", "zelcore65"},
       {"hyperlet", "zelcore"},
-      {"orkai5", "zelcore5"},
       {"orkai60", "zelcore6"},
-      {"skyvault60", "zelcore6"},
       {"skyvault67", "zelcore65"},
       {"orkai-lower", nullptr},
       {"orkai70", "zelcore7"},

@@ -13,11 +13,8 @@ TEST(GuessRedHat, MasteredMedia) {
       {"rhel3-x86", "rhel3"},
       {"rhel3-x64", "rhel3-64"},
       {"rhel4-x64", "rhel4-64"},
-      {"rhel4-x86", "rhel4"},
       {"rhel5-server-x64", "rhel5-64"},
       {"rhel5-client-x86", "rhel5"},
-      {"rhel6-x64", "rhel6-64"},
-      {"rhel6-x86", "rhel6"},
       {"rhel7-server-name", "rhel7-64", GUESS_VERSION_RHEL_SERVER},
       {"rhel7-workstation-name", "rhel7-64", GUESS_VERSION_RHEL_WORKSTATION},
       {"rhel7-client-name", "rhel7-64", GUESS_VERSION_RHEL_CLIENT},
@@ -45,7 +42,6 @@ TEST(GuessRedHat, MasteredMedia) {
       // The key comes before the release-name rows.
       {"centos5-rhel-name", "centos-64", GUESS_VERSION_CENTOS_5},
       {"centos6-x86", "centos6", GUESS_VERSION_CENTOS_6},
-      {"centos6-x64", "centos6-64", GUESS_VERSION_CENTOS_6},
       {"centos7", "centos7-64", GUESS_VERSION_CENTOS_7},
       {"centos7-last-perl", "centos7-64", GUESS_VERSION_CENTOS_7},
       {"centos7-minimal", "centos7-64", GUESS_VERSION_CENTOS_7_MINIMAL},
@@ -58,17 +54,13 @@ TEST(GuessRedHat, MasteredMedia) {
       // Oracle Linux and Asianux.
       {"asianux3", "asianux3-64"},
       {"asianux3-sp", "asianux3"},
-      {"asianux4", "asianux4-64"},
       {"asianux7", "asianux7-64"},
       {"asianux7-live-named", "asianux7-64", GUESS_VERSION_ASIANUX_7_LIVE},
       {"asianux7-live", "asianux7-64", GUESS_VERSION_ASIANUX_7_LIVE},
       {"oracle4", "oraclelinux"},
-      {"oracle5", "oraclelinux-64"},
-      {"oracle6", "oraclelinux6"},
       {"oracle7", "oraclelinux7-64"},
       // No fall-back on the older Oracle rows.
       {"oracle7-x86", nullptr},
-      {"oracle8", "oraclelinux8-64"},
       // Fedora.
       {"fedora-core6", "Fedora"},
       {"fedora7", "Fedora-64"},

@@ -16,7 +16,6 @@ TEST(GuessSUSE, MasteredMedia) {
       {"sled10", "sles10", GUESS_VERSION_SLED_10_SP2_OR_LOWER, kIso},
       {"sled10sp3", "sles10", GUESS_VERSION_SLED_ALL, kIso},
       {"sled11sp1", "sles11", GUESS_VERSION_SLED_ALL, kIso},
-      {"sles11", "sles11-64", 0, kIso},
       {"sles9", "sles-64", 0, kIso},
       {"sles-tarvex", "sles11-64", 0, kIso},
       {"suselinux", "suse", 0, kIso},
@@ -47,7 +46,6 @@ TEST(GuessSUSE, MasteredMedia) {
       // The products file.
       {"p-sled11-64", "sles11-64", GUESS_VERSION_SLED_ALL, kIso},
       {"p-sles10-32", "sles10", 0, kIso},
-      {"p-sles12-64", "sles12-64", 0, kIso},
       {"p-sles9", "sles", 0, kNoIso},
       {"p-suse-64", "suse-64", 0, kIso},
       {"p-suse", "suse", 0, kNoIso},

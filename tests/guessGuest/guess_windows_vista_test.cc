@@ -45,8 +45,6 @@ TEST(GuessWindowsVista, MasteredMedia) {
        "Windows 8.1"},
       {"win81-enterprise", "windows8-64", GUESS_VERSION_WINDOWS_81_ENTERPRISE,
        "Windows 8.1 Enterprise?", -1, "Windows 8.1 x64"},
-      {"win81-enterprise-n", "windows8", GUESS_VERSION_WINDOWS_81_ENTERPRISE,
-       "Windows 8.1 Enterprise_N?", -1, "Windows 8.1"},
       {"win81-trial", "windows8-64", GUESS_VERSION_WINDOWS_81_TRIAL, "Windows 8.1 ENTERPRISEEVAL?",
        -1, "Windows 8.1 x64"},
       // An ei.cfg that holds no word at all counts as one without the words.
@@ -62,8 +60,6 @@ TEST(GuessWindowsVista, MasteredMedia) {
       // product.ini alone makes a server medium.
       {"server2012r2-trial", "windows8srv-64", GUESS_VERSION_WINDOWS_SERVER_2012_R2_TRIAL, "", -1,
        "Windows Server 2012 R2"},
-      {"server2012r2-volume", "windows8srv-64", GUESS_VERSION_WINDOWS_SERVER_2012_R2_PLAIN,
-       "Windows Server 2012 R2 SERVERSTANDARDCORE", 4, "Windows Server 2012 R2"},
       {"hyperv2012r2", "winHyperV", GUESS_VERSION_WINDOWS_SERVER_2012_R2_PLAIN,
        "Hyper-V Server 2012 R2 SERVERHYPERCORE?"},
       // 10: the release line and ei.cfg choose the list.
@@ -76,8 +72,6 @@ TEST(GuessWindowsVista, MasteredMedia) {
        "Windows 10 Enterprise?"},
       {"win10-ltsb2015", "windows9-64", GUESS_VERSION_WINDOWS_10_ENTERPRISE,
        "Windows 10 Enterprise_2015_LTSB?"},
-      {"win10-ltsb2016-n", "windows9-64", GUESS_VERSION_WINDOWS_10_ENTERPRISE,
-       "Windows 10 Enterprise_N_2016_LTSB?"},
       {"win10-pro-ei", "windows9-64", GUESS_VERSION_WINDOWS_10_PLAIN, "Windows 10 Pro", 4},
       {"win10-esd-x86", "windows9", GUESS_VERSION_WINDOWS_10_ESD, "Windows 10 Pro", 4},
       // The ESD class is not given on Arm.
@@ -88,9 +82,6 @@ TEST(GuessWindowsVista, MasteredMedia) {
       {"win10-rs4-ei", "windows9-64", 0, "Windows 10 Education", 10},
       {"win10-rs5", "windows9-64", 0, "Windows 10 Home", 11},
       {"win10-rs5-ltsc", "windows9-64", 0, "Windows 10 Enterprise_LTSC_2019?"},
-      {"win10-rs5-education", "windows9-64", 0, "Windows 10 Education", 11},
-      {"win10-19h1", "windows9-64", 0, "Windows 10 Home", 11},
-      {"win10-vb-ei", "windows9-64", 0, "Windows 10 Education", 10},
       // A forced server flag keeps the Windows 10 identifier.
       {"win10-fbl", "windows9-64", 0, "Windows Server 2012 R2 SERVERSTANDARDCORE", 4},
       // Later servers and 11.
@@ -99,12 +90,9 @@ TEST(GuessWindowsVista, MasteredMedia) {
       {"hyperv2016", "winHyperV", 0, "Hyper-V Server 2016 SERVERHYPERCORE?"},
       {"server2016-tp5", "windows9srv-64", 0,
        "Windows Server 2016 Technical Preview 5 SERVERSTANDARDCORE", 4},
-      {"server2016-tp5-solution", "windows9srv-64", 0,
-       "Windows Server 2016 Technical Preview 5 SERVERSOLUTION", 1},
       {"server1709", "windows9srv-64", 0, "Windows Server 2016 SERVERSTANDARDACORE", 2},
       {"server2019", "windows2019srv-64", 0, "Windows Server 2019 SERVERSTANDARDCORE", 4},
       {"server2019-ei", "windows2019srv-64", 0, "Windows Server SERVERSTANDARDACORE", 2},
-      {"server2004", "windows2019srv-64", 0, "Windows Server SERVERSTANDARDACORE", 2},
       {"server2022", "windows2019srvNext-64", 0, "Windows Server 2022 SERVERSTANDARDCORE", 4},
       {"win11", "windows11-64", 0, "", -1, "", "en-US", "de-DE?en-US?"},
       {"win11-arm64", "arm-windows11-64", 0, ""},

