@@ -141,6 +141,7 @@ TEST(Iso9660Hostile, DirectoryRecords) {
        4096, ISO9660_ERR_CORRUPT},
       {"directory with multi-extent flag", tvxtest::RecordBytes({"D", 40, 2048, 0x82, ""}), 4096,
        ISO9660_ERR_CORRUPT},
+      {"directory ending inside a record", file, 68 + 12, ISO9660_ERR_CORRUPT},
       {"directory beyond the end", file, 1u << 24, ISO9660_ERR_CORRUPT},
       {"directory over 16 MiB", file, (16u << 20) + 2048, ISO9660_ERR_CORRUPT},
   };
