@@ -58,7 +58,6 @@ TEST(IniRead, ValuesOfAnswerFile) {
   WriteFileOrDie(path, kWinntSif);
   const ReadCase cases[] = {
       {"plain", "Unattended", "UnattendMode", 64, TRUE, "FullUnattended"},
-      {"quotes dropped", "Data", "UnattendedInstall", 64, TRUE, "Yes"},
       {"section and key ignore case", "gUIUNATTENDED", "adminpassword", 64, TRUE, "secret"},
       {"same key, first section", "GuiUnattended", "TimeZone", 64, TRUE, "85"},
       {"same key, second section", "UserData", "TimeZone", 64, TRUE, "4"},
