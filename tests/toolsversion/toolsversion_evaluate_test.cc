@@ -132,13 +132,6 @@ std::string Buckets(const Report &r) {
 }
 
 const StatusCase kStatusCases[] = {
-    {"monolithic too old without AVR", "monolithic.version = 11.1.0\n", nullptr,
-     "monolithic.version = 11.0.0\n", TOOLS_STATUS_TOO_OLD, "M=too old",
-     "Status is too old because this is status of monolithic version."},
-    {"monolithic supported new below the maximum", "monolithic.version = 11.1.0\n",
-     "monolithic.version = 10.0.0\nmonolithic.version_max = 12\n", "monolithic.version = 11.5.0\n",
-     TOOLS_STATUS_SUPPORTED_NEW, "M=supported new",
-     "Status is supported new because this is status of monolithic version."},
     {"monolithic too new above the maximum", "monolithic.version = 11.1.0\n",
      "monolithic.version_max = 11.1#2\n", "monolithic.version = 11.2.0\n", TOOLS_STATUS_TOO_NEW,
      "M=too new", "Status is too new because this is status of monolithic version."},
