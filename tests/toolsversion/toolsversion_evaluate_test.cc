@@ -47,9 +47,6 @@ TEST(ToolsVersionNumber, ParsesAndFormats) {
     }
     EXPECT_EQ(FormatVersion(v), c.formatted) << c.text;
   }
-  ToolsVersionNumber zero{};
-  ParseVersion("1.2.3.4#0", &zero);
-  EXPECT_EQ(FormatVersion(zero, true), "1.2.3.4#0");
 }
 
 TEST(ToolsVersionManifest, RejectedEntriesAreLoggedForHostAndAvrOnly) {
