@@ -63,7 +63,6 @@ TEST(ToolsVersionManifest, RejectedEntriesAreLoggedForHostAndAvrOnly) {
       {MANIFEST_HOST, "alpha.colour", "red", "Unknown entry"},
       {MANIFEST_AVR, "debug.log", "true", "Unknown debug entry"},
       {MANIFEST_HOST, "alpha.version", "1.2.3x", "Cannot parse version"},
-      {MANIFEST_GUEST, "alpha.version", "1.2.3x", nullptr},
       {MANIFEST_AVR, "alpha.version_illegal", "10.0.0;9.4", "Cannot parse illegal version"},
       {MANIFEST_HOST, "alpha.VERSION", "1.2.3 ", nullptr},
   };
