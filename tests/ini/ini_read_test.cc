@@ -15,14 +15,10 @@ const char kWinntSif[] =
     "; generated answer file\n"
     "[Data]\n"
     "AutoPartition=1\n"
-    "MsDosInitiated=\"0\"\n"
-    "UnattendedInstall=\"Yes\"\n"
     "\n"
     "[Unattended]\n"
     "UnattendMode=FullUnattended\n"
     "OemSkipEula=Yes\n"
-    "OemPreinstall=No\n"
-    "TargetPath=\\WINDOWS\n"
     "  Indented = spaced\n"
     "Padded=  \t value with blanks \t \n"
     "Comment=plain ; trailing remark\n"
@@ -35,11 +31,8 @@ const char kWinntSif[] =
     "[GuiUnattended]\n"
     "AdminPassword=\"secret\"\n"
     "TimeZone=85\n"
-    "OemSkipWelcome=1\n"
     "[UserData]\n"
     "FullName=\"Jane Doe\"\n"
-    "OrgName=\"Example Org\"\n"
-    "ComputerName=*\n"
     "TimeZone=4\n"
     "[CrLf]\r\nA=\"quoted\"\r\nB=x \r\nBare\r\n[Next]\r\n";
 
@@ -58,7 +51,6 @@ TEST(IniRead, ValuesOfAnswerFile) {
   WriteFileOrDie(path, kWinntSif);
   const ReadCase cases[] = {
       {"plain", "Unattended", "UnattendMode", 64, TRUE, "FullUnattended"},
-      {"quotes dropped", "Data", "UnattendedInstall", 64, TRUE, "Yes"},
       {"section and key ignore case", "gUIUNATTENDED", "adminpassword", 64, TRUE, "secret"},
       {"same key, first section", "GuiUnattended", "TimeZone", 64, TRUE, "85"},
       {"same key, second section", "UserData", "TimeZone", 64, TRUE, "4"},

@@ -15,6 +15,7 @@
 #include "support/http_server.h"
 #include "support/log_capture.h"
 #include "support/test_pki.h"
+#include "toolsImage/signed_image.h"
 #include "tvx_toolsiso_image.h"
 
 namespace {
@@ -23,39 +24,6 @@ using tvxtest::LogCapture;
 using tvxtest::ReadFileOrDie;
 using tvxtest::TempDir;
 using tvxtest::WriteFileOrDie;
-
-// A tools tree with a manifest and a file of many blocks, mastered with
-// Rock Ridge and Joliet names.
-std::string MasterIso(const TempDir &dir, const std::string &name) {
-  std::string tree = dir.Join("tree-" + name);
-  std::filesystem::create_directories(tree + "/guesttools");
-  WriteFileOrDie(tree + "/manifest.txt", "tools.version = \"12.1.0\"\n");
-  WriteFileOrDie(tree + "/guesttools/payload.bin", tvxtest::Bytes(150001, 3));
-  std::string iso = dir.Join(name);
-  int rc = tvxtest::RunArgv({"xorriso", "-as", "mkisofs", "-quiet", "-R", "-J", "-o", iso, tree});
-  EXPECT_EQ(rc, 0);
-  return iso;
-}
-
-// SignerCert is the maker's leaf with its chain, as the hash-data writer
-// takes it.
-std::string SignerCert(const std::string &certDir, const TempDir &dir) {
-  std::string path = dir.Join("maker-chain.pem");
-  WriteFileOrDie(path, ReadFileOrDie(certDir + "signers/maker.pem") +
-                           ReadFileOrDie(certDir + "signers/maker.chain"));
-  return path;
-}
-
-int WriteHashData(const std::string &certDir, const std::string &cert, const std::string &iso,
-                  uint32_t blockSize, bool embed) {
-  std::vector<std::string> argv = {tvxtest::ToolPath(), "hashdata", "create", "--block-size",
-                                   std::to_string(blockSize), "--quiet", "--key",
-                                   certDir + "signers/maker.key", "--cert", cert};
-  if (embed) argv.push_back("--embed-signature");
-  argv.push_back(iso);
-  argv.push_back(iso + ".sha");
-  return tvxtest::RunArgv(argv);
-}
 
 void FlipByte(const std::string &path, uint64_t offset) {
   std::string b = ReadFileOrDie(path);
@@ -68,20 +36,17 @@ class ToolsImageRead : public testing::Test {
   void SetUp() override {
     certDir_ = tvxtest::TestCertDir();
     if (certDir_.empty()) GTEST_SKIP() << "no test PKI in this build";
-    cert_ = SignerCert(certDir_, dir_);
   }
-  // Image makes IMAGE (+ .sha, + .sig unless embedded) in the temp dir;
-  // `pad` bytes are appended to the image first.
   std::string Image(const std::string &name, uint32_t blockSize = 2048, bool embed = false,
                     size_t pad = 0) {
-    std::string iso = MasterIso(dir_, name);
-    if (pad != 0) WriteFileOrDie(iso, ReadFileOrDie(iso) + std::string(pad, '\0'));
-    EXPECT_EQ(WriteHashData(certDir_, cert_, iso, blockSize, embed), 0);
+    std::string iso = tvxtest::SignedToolsImage(dir_, certDir_, name, "tools.version = \"12.1.0\"\n",
+                                                blockSize, embed, pad);
+    EXPECT_NE(iso, "");
     return iso;
   }
 
   TempDir dir_;
-  std::string certDir_, cert_;
+  std::string certDir_;
 };
 
 ToolsIsoLocalFile *OpenOk(const std::string &iso) {
@@ -176,9 +141,7 @@ TEST_F(ToolsImageRead, OpenChecksHashDataAndSignature) {
   std::string iso = Image("tools.iso");
   std::string sha = ReadFileOrDie(iso + ".sha"), sig = ReadFileOrDie(iso + ".sig");
   const std::string image = ReadFileOrDie(iso);
-  char *realC = ToolsISO_GetRealPath(iso.c_str());
-  const std::string real = realC;
-  free(realC);
+  const std::string real = std::filesystem::canonical(iso);
   std::string stranger = tvxtest::Sign(certDir_, "stranger", sha, false);
   ASSERT_FALSE(stranger.empty());
   const std::string huge(image.size(), 'x');

@@ -90,7 +90,6 @@ TEST_F(ToolsImageSelect, ChoosesFromTableMapAndHint) {
     uint32_t mode;
     std::vector<std::string> logs;  // "%m" stands for the canonical map path
   } cases[] = {
-      {"windows row", Map::kNone, "windows9-64", nullptr, true, "windows.iso", "windows", 2, {}},
       {"first row wins for winNT", Map::kNone, "winNT", nullptr, true, "winPre2k.iso", "winPre2k", 2, {}},
       {"linux row", Map::kNone, "rhel6", nullptr, true, "linux.iso", "linux", 4, {}},
       {"hypervisor row has no image", Map::kNone, "zelcore", nullptr, true, nullptr, nullptr, 0, {}},
