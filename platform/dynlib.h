@@ -30,4 +30,15 @@ class DynLib {
   void *handle_;
 };
 
+// LoadOnce runs `fill` on a table of entry points the first time it is
+// called (from any thread; C++ makes the static's start-up safe) and then
+// hands out that table, or null when `fill` failed. Each caller passes its
+// own lambda, so each gets its own table.
+template <typename Api, typename Fill>
+const Api *LoadOnce(Fill fill) {
+  static Api api;
+  static const bool ok = fill(&api);
+  return ok ? &api : nullptr;
+}
+
 }  // namespace tvx

@@ -13,7 +13,6 @@
 #include <cstdlib>
 #include <cstring>
 #include <memory>
-#include <mutex>
 #include <string>
 
 #include "platform/ascii.h"
@@ -34,21 +33,17 @@ struct CurlApi {
 // LoadCurl returns the loaded library's entry points, or null when it is
 // missing.
 const CurlApi *LoadCurl() {
-  static CurlApi api;
-  static bool ok = false;
-  static std::once_flag once;
-  std::call_once(once, [] {
+  return tvx::LoadOnce<CurlApi>([](CurlApi *api) {
     tvx::DynLib lib("libcurl.so.4");
-    ok = lib.Resolve("curl_global_init", &api.global_init) &&
-         lib.Resolve("curl_easy_init", &api.easy_init) &&
-         lib.Resolve("curl_easy_cleanup", &api.easy_cleanup) &&
-         lib.Resolve("curl_easy_reset", &api.easy_reset) &&
-         lib.Resolve("curl_easy_perform", &api.easy_perform) &&
-         lib.Resolve("curl_easy_setopt", &api.easy_setopt) &&
-         lib.Resolve("curl_easy_getinfo", &api.easy_getinfo) &&
-         api.global_init(CURL_GLOBAL_DEFAULT) == CURLE_OK;
+    return lib.Resolve("curl_global_init", &api->global_init) &&
+           lib.Resolve("curl_easy_init", &api->easy_init) &&
+           lib.Resolve("curl_easy_cleanup", &api->easy_cleanup) &&
+           lib.Resolve("curl_easy_reset", &api->easy_reset) &&
+           lib.Resolve("curl_easy_perform", &api->easy_perform) &&
+           lib.Resolve("curl_easy_setopt", &api->easy_setopt) &&
+           lib.Resolve("curl_easy_getinfo", &api->easy_getinfo) &&
+           api->global_init(CURL_GLOBAL_DEFAULT) == CURLE_OK;
   });
-  return ok ? &api : nullptr;
 }
 
 // An error page is read (and dropped) up to this size; a larger one ends the

@@ -9,7 +9,6 @@
 #include <cstdlib>
 #include <cstring>
 #include <fstream>
-#include <mutex>
 #include <string>
 
 #include <climits>
@@ -161,15 +160,11 @@ struct IcuApi {
 // zone name, and linking ICU would slow every process's start-up. Null when
 // it cannot be loaded.
 const IcuApi *LoadIcu() {
-  static IcuApi api;
-  static bool ok = false;
-  static std::once_flag once;
-  std::call_once(once, [] {
+  return tvx::LoadOnce<IcuApi>([](IcuApi *api) {
     tvx::DynLib lib("libicui18n.so." TVX_ICU_NAME(U_ICU_VERSION_MAJOR_NUM));
-    ok = lib.Resolve(TVX_ICU_NAME(ucal_getDefaultTimeZone), &api.getDefaultTimeZone) &&
-         lib.Resolve(TVX_ICU_NAME(ucal_getWindowsTimeZoneID), &api.getWindowsTimeZoneID);
+    return lib.Resolve(TVX_ICU_NAME(ucal_getDefaultTimeZone), &api->getDefaultTimeZone) &&
+           lib.Resolve(TVX_ICU_NAME(ucal_getWindowsTimeZoneID), &api->getWindowsTimeZoneID);
   });
-  return ok ? &api : nullptr;
 }
 
 // Zone identifiers, in both ICU's and the tz database's spelling, are ASCII;
