@@ -196,12 +196,19 @@ int Run(const std::vector<std::string> &args) {
       log.push_back(std::string("no Linux answer file is made for ") + guess.guestOS);
     }
   }
+  // The media are made from the staged answer file, which moves into --out
+  // last: a medium that cannot be made leaves nothing new in either folder.
+  std::vector<std::string> media;
+  ok = ok && ContinueWithMedia(o.image, guess, stage.dir(), o.media, o.json, &media, &log);
   if (ok && !stage.Commit(&error)) {
     ok = false;
     log.push_back("cannot move the answer file into " + o.out + ": " + error);
+    for (const std::string &m : media) log.push_back("written all the same: " + m);
   }
-  if (ok) files = FilesBelow(stage.committed());
-  ok = ok && ContinueWithMedia(o.image, guess, o.out, o.media, o.json, &files, &log);
+  if (ok) {
+    files = FilesBelow(stage.committed());
+    files.insert(files.end(), media.begin(), media.end());
+  }
 
   return ReportAnswers({kName, &o.image, &guess, static_cast<bool>(ok), static_cast<bool>(supported),
                         nullptr, &files, &log, "the answer file was not written"},

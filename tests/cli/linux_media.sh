@@ -114,6 +114,7 @@ if "$tool" unattended linux --help >/dev/null 2>&1; then
   check "a failing mastering tool: exit 1" status 1 "$tool" unattended linux "${answers[@]}" \
     --out "$tmp/ans2" --media "$tmp/failed" --mkisofs /bin/false "$tmp/centos.iso"
   check "... and nothing left in the media directory" test -z "$(ls -A "$tmp/failed" 2>/dev/null)"
+  check "... nor in the answer directory" test -z "$(ls -A "$tmp/ans2" 2>/dev/null)"
   check "... nor any staging directory" test -z "$(find "$tmp" -maxdepth 1 -name '.*staging*')"
   ubuiso=$tmp/ubu2004.iso
   mkdir -p "$tmp/u2004/.disk"
