@@ -74,12 +74,24 @@ StagedOutput::~StagedOutput() {
   if (stage_.empty()) return;
   std::error_code ec;
   fs::remove_all(stage_, ec);  // never follows links out of the tree
+  if (!committed_.empty()) return;
+  // Nothing moved in: what Open and Commit made goes again, innermost first,
+  // as long as it is empty (fs::remove leaves a directory that is not).
+  if (madeOut_) fs::remove(out_, ec);
+  if (created_.empty()) return;
+  for (fs::path p = parent_; fs::remove(p, ec) && p != created_; p = p.parent_path()) {
+  }
 }
 
 bool StagedOutput::Open(std::string *err) {
   fs::path out(out_);
   fs::path parent = out.has_parent_path() ? out.parent_path() : fs::path(".");
   std::error_code ec;
+  fs::path missing;
+  for (fs::path p = parent; !p.empty() && !fs::exists(fs::symlink_status(p, ec));
+       p = p.parent_path()) {
+    missing = p;
+  }
   fs::create_directories(parent, ec);
   if (ec) {
     *err = parent.string() + ": " + ec.message();
@@ -91,6 +103,8 @@ bool StagedOutput::Open(std::string *err) {
     return false;
   }
   stage_ = tmpl;
+  parent_ = parent.string();
+  created_ = missing.string();
   return true;
 }
 
@@ -101,6 +115,7 @@ bool StagedOutput::Commit(std::string *err) {
       *err = out_ + ": " + (exists ? "not a directory" : std::strerror(errno));
       return false;
     }
+    madeOut_ = true;
   }
   std::vector<std::string> names = Names(stage_);
   if (!Check(stage_, out_, err) || !Move(stage_, out_, err)) return false;

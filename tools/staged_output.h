@@ -34,7 +34,8 @@ class StagedOutput {
   StagedOutput &operator=(const StagedOutput &) = delete;
 
   // Open creates the staging directory (and the parents of the output
-  // directory when they are missing). False with a message in `err`.
+  // directory when they are missing; they are removed again, when empty, if
+  // nothing is committed). False with a message in `err`.
   bool Open(std::string *err);
   // dir is the staging directory: write the files here.
   const std::string &dir() const { return stage_; }
@@ -47,6 +48,9 @@ class StagedOutput {
  private:
   std::string out_;
   std::string stage_;
+  std::string parent_;   // the output directory's parent
+  std::string created_;  // the outermost of its parents that Open made, or ""
+  bool madeOut_ = false;  // Commit made the output directory
   std::vector<std::string> committed_;
 };
 

@@ -60,7 +60,7 @@ if usable "$debian"; then
   check "debian: exit 1" test $? -eq 1
   check "debian: says why" grep -q 'no Linux answer file is made for debian11-64' "$tmp/err"
 fi
-check "failures leave nothing in --out" test ! -e "$tmp/f/deb"
+check "failures leave nothing, not even the folders made for --out" test ! -e "$tmp/f"
 check "no staging directory left" test -z "$(find "$tmp" -name '*.staging-*')"
 check "missing --user: exit 64" status 64 "$tool" unattended linux --full-name x --password p \
   --out "$tmp/u" "$centos"
