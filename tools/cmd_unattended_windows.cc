@@ -185,12 +185,9 @@ int Run(const std::vector<std::string> &args) {
   if (rc >= 0) return rc;
 
   GuessResult guess;
-  if (int status = RecogniseForAnswers(kName, o.image, o.json, &guess); status >= 0) return status;
-
-  bool supported = AutoInstall_IsSupportedGuest(&guess);
-  if (!supported && !o.json) {
-    std::fprintf(stderr, "tvxguest %s: note: unattended install is not offered for %s\n", kName,
-                 GuestLabel(guess).c_str());
+  bool supported;
+  if (int status = RecogniseForAnswers(kName, o.image, o.json, &guess, &supported); status >= 0) {
+    return status;
   }
   std::vector<std::string> editions = SplitEditions(guess.editions);
   bool offered = editions.empty();

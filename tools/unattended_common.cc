@@ -115,9 +115,17 @@ std::string CheckAnswer(const GuessResult &guess, const char *label, const std::
   return who + " is refused: " + why;
 }
 
-int RecogniseForAnswers(const char *cmd, const std::string &image, bool json, GuessResult *out) {
+int RecogniseForAnswers(const char *cmd, const std::string &image, bool json, GuessResult *out,
+                        bool *supported) {
   int rc = RecogniseImage(cmd, image, out);
-  if (rc == 0 && out->guestOS != nullptr) return -1;
+  if (rc == 0 && out->guestOS != nullptr) {
+    *supported = AutoInstall_IsSupportedGuest(out);
+    if (!*supported && !json) {
+      std::fprintf(stderr, "tvxguest %s: note: unattended install is not offered for %s\n", cmd,
+                   GuestLabel(*out).c_str());
+    }
+    return -1;
+  }
   if (json) {
     std::printf("%s\n", JsonObject()
                             .Bool("result", false)

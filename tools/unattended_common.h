@@ -19,8 +19,11 @@ int RecogniseImage(const char *cmd, const std::string &image, GuessResult *out);
 // RecogniseForAnswers recognises `image` for a command that writes answer
 // files: -1 when a guest was recognised, else the exit status after telling
 // why (a JSON object with `json`, else a line on standard error): 1 nothing
-// recognised, 2 not an image.
-int RecogniseForAnswers(const char *cmd, const std::string &image, bool json, GuessResult *out);
+// recognised, 2 not an image. On -1, `supported` says whether unattended
+// install is offered for the guest (a note on standard error when it is not,
+// unless `json`).
+int RecogniseForAnswers(const char *cmd, const std::string &image, bool json, GuessResult *out,
+                        bool *supported);
 
 // GuestFamily gives "windows" for Windows guest identifiers and "linux" for
 // every other, as the host picks the family of its answer limits.
