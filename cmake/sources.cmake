@@ -98,6 +98,7 @@ set(TVX_LIBRARY_SOURCES
 )
 
 set(TVX_TOOL_SOURCES
+  tools/arg_parser.cc
   tools/cmd_crypt.cc
   tools/cmd_detect.cc
   tools/cmd_floppy.cc

@@ -8,6 +8,7 @@
 #include <string>
 #include <vector>
 
+#include "arg_parser.h"
 #include "command.h"
 #include "json.h"
 #include "tvx_autoinstall_linux.h"
@@ -47,29 +48,13 @@ int Run(const std::vector<std::string> &args) {
   std::string salt, check, password;
   bool haveSalt = false, haveCheck = false, fromStdin = false, json = false;
   std::vector<std::string> positional;
-  for (size_t i = 0; i < args.size(); ++i) {
-    const std::string &a = args[i];
-    if (IsHelp(a)) {
-      PrintHelp();
-      return 0;
-    }
-    if (a == "--json") {
-      json = true;
-    } else if (a == "--stdin") {
-      fromStdin = true;
-    } else if (a == "--salt" || a == "--check") {
-      if (i + 1 >= args.size()) return UsageError(kName, a + " needs a value");
-      (a == "--salt" ? salt : check) = args[++i];
-      (a == "--salt" ? haveSalt : haveCheck) = true;
-    } else if (a == "--") {
-      positional.insert(positional.end(), args.begin() + i + 1, args.end());
-      break;
-    } else if (a.size() > 1 && a[0] == '-') {
-      return UsageError(kName, "unknown option '" + a + "'");
-    } else {
-      positional.push_back(a);
-    }
-  }
+  int parsed = ArgParser(kName, PrintHelp)
+                   .Flag("--json", &json)
+                   .Flag("--stdin", &fromStdin)
+                   .Value("--salt", &salt, &haveSalt)
+                   .Value("--check", &check, &haveCheck)
+                   .Parse(args, &positional);
+  if (parsed >= 0) return parsed;
   if (haveSalt && haveCheck) return UsageError(kName, "give --salt or --check, not both");
   if (positional.size() != (fromStdin ? 0u : 1u)) {
     return UsageError(kName, "expected exactly one PASSWORD, or --stdin");

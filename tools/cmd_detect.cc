@@ -11,6 +11,7 @@
 #include <utility>
 #include <vector>
 
+#include "arg_parser.h"
 #include "command.h"
 #include "json.h"
 #include "tvx_guess.h"
@@ -167,26 +168,18 @@ int Run(const std::vector<std::string> &args) {
   bool json = false;
   // In the order given; a directory is one entry until it is walked.
   std::vector<std::pair<bool, std::string>> targets;
-  bool options = true;
-  for (size_t i = 0; i < args.size(); ++i) {
-    const std::string &a = args[i];
-    if (options && IsHelp(a)) {
-      std::fputs(kUsage, stdout);
-      return 0;
-    }
-    if (options && a == "--json") {
-      json = true;
-    } else if (options && a == "-r") {
-      if (i + 1 == args.size()) return UsageError("detect", "-r needs a DIR");
-      targets.emplace_back(true, args[++i]);
-    } else if (options && a == "--") {
-      options = false;
-    } else if (options && a.size() > 1 && a[0] == '-') {
-      return UsageError("detect", "unknown option '" + a + "'");
-    } else {
-      targets.emplace_back(false, a);
-    }
-  }
+  auto add = [&targets](bool isDir) {
+    return [&targets, isDir](const std::string &name) {
+      targets.emplace_back(isDir, name);
+      return std::string();
+    };
+  };
+  int parsed = ArgParser("detect", [] { std::fputs(kUsage, stdout); })
+                   .Flag("--json", &json)
+                   .Value("-r", add(true))
+                   .Positional(add(false))
+                   .Parse(args);
+  if (parsed >= 0) return parsed;
   if (targets.empty()) return UsageError("detect", "IMAGE is missing");
 
   if (targets.size() == 1 && !targets[0].first) {

@@ -7,6 +7,7 @@
 #include <string>
 #include <vector>
 
+#include "arg_parser.h"
 #include "command.h"
 #include "floppy_cli.h"
 #include "json.h"
@@ -157,29 +158,24 @@ int Run(const std::vector<std::string> &args) {
   const std::string &sub = args[0];
   bool json = false, force = false;
   uint64_t kb = 1440;
-  std::vector<std::string> pos;
-  for (size_t i = 0; i < args.size(); ++i) {
-    const std::string &a = args[i];
-    if (IsHelp(a)) {
-      std::fputs(kUsage, stdout);
-      return 0;
-    }
-    if (i == 0) continue;
-    if (a == "--json" && sub == "ls") {
-      json = true;
-    } else if (a == "--force" && sub == "format") {
-      force = true;
-    } else if (a == "--size" && sub == "format") {
-      if (i + 1 >= args.size()) return UsageError(kName, "--size needs a value");
-      const std::string &v = args[++i];
-      if (v != "720" && v != "1440" && v != "2880") return UsageError(kName, "--size is 720, 1440 or 2880");
-      kb = std::strtoull(v.c_str(), nullptr, 10);
-    } else if (a.size() > 1 && a[0] == '-') {
-      return UsageError(kName, "unknown option " + a);
-    } else {
-      pos.push_back(a);
-    }
+  auto help = [] { std::fputs(kUsage, stdout); };
+  if (IsHelp(sub)) {
+    help();
+    return 0;
   }
+  ArgParser parser(kName, help);
+  if (sub == "ls") parser.Flag("--json", &json);
+  if (sub == "format") {
+    parser.Flag("--force", &force).Value("--size", [&kb](const std::string &v) {
+      if (v != "720" && v != "1440" && v != "2880")
+        return std::string("--size is 720, 1440 or 2880");
+      kb = std::strtoull(v.c_str(), nullptr, 10);
+      return std::string();
+    });
+  }
+  std::vector<std::string> pos;
+  int status = parser.Parse({args.begin() + 1, args.end()}, &pos);
+  if (status >= 0) return status;
   struct Arity {
     const char *sub;
     size_t min, max;

@@ -7,6 +7,7 @@
 #include <string>
 #include <vector>
 
+#include "arg_parser.h"
 #include "command_group.h"
 #include "hashdata_writer.h"
 #include "json.h"
@@ -69,30 +70,15 @@ int Create(const std::vector<std::string> &args) {
   HashDataOptions options;
   std::string key, cert, sigPath, blockText;
   std::vector<std::string> files;
-  for (size_t i = 0; i < args.size(); ++i) {
-    const std::string &a = args[i];
-    bool hasValue = i + 1 < args.size();
-    if (IsHelp(a)) {
-      PrintCreateHelp(stdout);
-      return 0;
-    } else if (a == "--block-size" && hasValue) {
-      blockText = args[++i];
-    } else if (a == "--embed-signature") {
-      options.embedSignature = true;
-    } else if (a == "--key" && hasValue) {
-      key = args[++i];
-    } else if (a == "--cert" && hasValue) {
-      cert = args[++i];
-    } else if (a == "--sig" && hasValue) {
-      sigPath = args[++i];
-    } else if (a == "--quiet") {
-      options.quiet = true;
-    } else if (!a.empty() && a[0] == '-') {
-      return UsageError(kCreate, "unknown option or missing value '" + a + "'");
-    } else {
-      files.push_back(a);
-    }
-  }
+  int parsed = ArgParser(kCreate, [] { PrintCreateHelp(stdout); })
+                   .Value("--block-size", &blockText)
+                   .Flag("--embed-signature", &options.embedSignature)
+                   .Value("--key", &key)
+                   .Value("--cert", &cert)
+                   .Value("--sig", &sigPath)
+                   .Flag("--quiet", &options.quiet)
+                   .Parse(args, &files);
+  if (parsed >= 0) return parsed;
   if (files.size() != 2) return UsageError(kCreate, "IMAGE and OUT are needed");
   char *end = nullptr;
   unsigned long block = std::strtoul(blockText.c_str(), &end, 10);
@@ -177,26 +163,13 @@ int Check(const std::vector<std::string> &args) {
   bool json = false, quiet = false;
   std::string cert, sigPath;
   std::vector<std::string> files;
-  for (size_t i = 0; i < args.size(); ++i) {
-    const std::string &a = args[i];
-    bool hasValue = i + 1 < args.size();
-    if (IsHelp(a)) {
-      PrintCheckHelp(stdout);
-      return 0;
-    } else if (a == "--json") {
-      json = true;
-    } else if (a == "--quiet") {
-      quiet = true;
-    } else if (a == "--cert" && hasValue) {
-      cert = args[++i];
-    } else if (a == "--sig" && hasValue) {
-      sigPath = args[++i];
-    } else if (!a.empty() && a[0] == '-') {
-      return UsageError(kCheck, "unknown option or missing value '" + a + "'");
-    } else {
-      files.push_back(a);
-    }
-  }
+  int parsed = ArgParser(kCheck, [] { PrintCheckHelp(stdout); })
+                   .Flag("--json", &json)
+                   .Flag("--quiet", &quiet)
+                   .Value("--cert", &cert)
+                   .Value("--sig", &sigPath)
+                   .Parse(args, &files);
+  if (parsed >= 0) return parsed;
   if (files.size() != 2) return UsageError(kCheck, "HASHDATA and IMAGE are needed");
   if (sigPath.empty()) sigPath = CompanionSig(files[0]);
 

@@ -14,6 +14,7 @@
 #include <string>
 #include <vector>
 
+#include "arg_parser.h"
 #include "command.h"
 #include "json.h"
 #include "tvx_iso9660.h"
@@ -258,24 +259,11 @@ int RunMedia(const std::vector<std::string> &args) {
   }
   const std::string &sub = args[0];
   bool recursive = false, json = false, isoOnly = false;
+  ArgParser parser("media", [] { std::fputs(kUsage, stdout); });
+  parser.Flag("--iso9660", &isoOnly);
+  if (sub == "ls") parser.Flag("-R", &recursive).Flag("--json", &json);
   std::vector<std::string> pos;
-  for (size_t i = 1; i < args.size(); ++i) {
-    const std::string &a = args[i];
-    if (IsHelp(a)) {
-      std::fputs(kUsage, stdout);
-      return 0;
-    } else if (a == "--iso9660") {
-      isoOnly = true;
-    } else if (a == "-R" && sub == "ls") {
-      recursive = true;
-    } else if (a == "--json" && sub == "ls") {
-      json = true;
-    } else if (a.size() > 1 && a[0] == '-') {
-      return UsageError("media", "unknown option " + a);
-    } else {
-      pos.push_back(a);
-    }
-  }
+  if (int rc = parser.Parse({args.begin() + 1, args.end()}, &pos); rc >= 0) return rc;
   size_t want = sub == "ls" ? 1 : sub == "cat" ? 2 : sub == "extract" ? 3 : 0;
   if (want == 0) return UsageError("media", "unknown subcommand " + sub);
   if (pos.size() < want || pos.size() > (sub == "ls" ? 2u : want)) {

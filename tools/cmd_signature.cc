@@ -8,6 +8,7 @@
 #include <string>
 #include <vector>
 
+#include "arg_parser.h"
 #include "command_group.h"
 #include "hashdata_writer.h"
 #include "json.h"
@@ -38,26 +39,13 @@ void PrintVerifyHelp(FILE *out) {
 int Verify(const std::vector<std::string> &args) {
   bool json = false;
   std::string dataPath, cert, sigPath;
-  for (size_t i = 0; i < args.size(); ++i) {
-    const std::string &a = args[i];
-    bool hasValue = i + 1 < args.size();
-    if (IsHelp(a)) {
-      PrintVerifyHelp(stdout);
-      return 0;
-    } else if (a == "--json") {
-      json = true;
-    } else if (a == "--data" && hasValue) {
-      dataPath = args[++i];
-    } else if (a == "--cert" && hasValue) {
-      cert = args[++i];
-    } else if (!a.empty() && a[0] == '-') {
-      return UsageError(kVerify, "unknown option or missing value '" + a + "'");
-    } else if (sigPath.empty()) {
-      sigPath = a;
-    } else {
-      return UsageError(kVerify, "more than one SIGNATURE");
-    }
-  }
+  int parsed = ArgParser(kVerify, [] { PrintVerifyHelp(stdout); })
+                   .Flag("--json", &json)
+                   .Value("--data", &dataPath)
+                   .Value("--cert", &cert)
+                   .Positional(ArgParser::Single(&sigPath, "SIGNATURE"))
+                   .Parse(args);
+  if (parsed >= 0) return parsed;
   if (sigPath.empty()) return UsageError(kVerify, "SIGNATURE is missing");
 
   std::string data, readError;

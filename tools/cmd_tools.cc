@@ -7,6 +7,7 @@
 #include <string>
 #include <vector>
 
+#include "arg_parser.h"
 #include "command_group.h"
 #include "json.h"
 #include "tools_common.h"
@@ -42,26 +43,13 @@ int Image(const std::vector<std::string> &args) {
   std::string hint, cert;
   bool hasHint = false, unsignedOk = false, json = false;
   std::vector<std::string> pos;
-  for (size_t i = 0; i < args.size(); i++) {
-    const std::string &a = args[i];
-    if (IsHelp(a)) {
-      std::fputs(kUsage, stdout);
-      return 0;
-    } else if (a == "--hint" && i + 1 < args.size()) {
-      hint = args[++i];
-      hasHint = true;
-    } else if (a == "--cert" && i + 1 < args.size()) {
-      cert = args[++i];
-    } else if (a == "--unsigned-ok") {
-      unsignedOk = true;
-    } else if (a == "--json") {
-      json = true;
-    } else if (a.size() > 1 && a[0] == '-') {
-      return UsageError(kCmd, "unknown option or missing value '" + a + "'");
-    } else {
-      pos.push_back(a);
-    }
-  }
+  int parsed = ArgParser(kCmd, [] { std::fputs(kUsage, stdout); })
+                   .Value("--hint", &hint, &hasHint)
+                   .Value("--cert", &cert)
+                   .Flag("--unsigned-ok", &unsignedOk)
+                   .Flag("--json", &json)
+                   .Parse(args, &pos);
+  if (parsed >= 0) return parsed;
   if (pos.size() != 2) return UsageError(kCmd, "TOOLSDIR and GUESTOS are needed");
 
   LogLines log;

@@ -10,6 +10,7 @@
 #include <string>
 #include <vector>
 
+#include "arg_parser.h"
 #include "command_group.h"
 #include "json.h"
 #include "tools_common.h"
@@ -67,6 +68,11 @@ bool ParseInt(const std::string &text, long long lo, long long hi, long long *ou
   if (errno != 0 || *end != '\0' || v < lo || v > hi) return false;
   *out = v;
   return true;
+}
+
+// IntOption takes an option's value as a number within lo..hi.
+ArgParser::Take IntOption(long long lo, long long hi, long long *out, const char *error) {
+  return [=](const std::string &v) { return ParseInt(v, lo, hi, out) ? std::string() : error; };
 }
 
 bool ReadWhole(const std::string &path, std::string *out) {
@@ -140,34 +146,17 @@ int Status(const std::vector<std::string> &args) {
   std::string guestManifest, config, cert;
   long long toolsVersion = TOOLS_VERSION_FROM_DISKS, mode = 0;
   bool json = false;
-  for (size_t i = 0; i < args.size(); i++) {
-    const std::string &a = args[i];
-    bool hasValue = i + 1 < args.size();
-    if (IsHelp(a)) {
-      std::fputs(kStatusUsage, stdout);
-      return 0;
-    } else if (a == "--guest-manifest" && hasValue) {
-      guestManifest = args[++i];
-    } else if (a == "--tools-version" && hasValue) {
-      if (!ParseInt(args[++i], 0, 0xFFFFFFFFLL, &toolsVersion)) {
-        return UsageError(kStatusCmd, "--tools-version needs a number from 0 to 4294967295");
-      }
-    } else if (a == "--mode" && hasValue) {
-      if (!ParseInt(args[++i], INT32_MIN, INT32_MAX, &mode)) {
-        return UsageError(kStatusCmd, "--mode needs a number");
-      }
-    } else if (a == "--cert" && hasValue) {
-      cert = args[++i];
-    } else if (a == "--json") {
-      json = true;
-    } else if (a.size() > 1 && a[0] == '-') {
-      return UsageError(kStatusCmd, "unknown option or missing value '" + a + "'");
-    } else if (config.empty()) {
-      config = a;
-    } else {
-      return UsageError(kStatusCmd, "more than one VMCONFIG");
-    }
-  }
+  int parsed = ArgParser(kStatusCmd, [] { std::fputs(kStatusUsage, stdout); })
+                   .Value("--guest-manifest", &guestManifest)
+                   .Value("--tools-version",
+                          IntOption(0, 0xFFFFFFFFLL, &toolsVersion,
+                                    "--tools-version needs a number from 0 to 4294967295"))
+                   .Value("--mode", IntOption(INT32_MIN, INT32_MAX, &mode, "--mode needs a number"))
+                   .Value("--cert", &cert)
+                   .Flag("--json", &json)
+                   .Positional(ArgParser::Single(&config, "VMCONFIG"))
+                   .Parse(args);
+  if (parsed >= 0) return parsed;
   if (config.empty()) return UsageError(kStatusCmd, "VMCONFIG is missing");
 
   Dictionary *dict = Dictionary_Create();
@@ -206,28 +195,16 @@ int Status(const std::vector<std::string> &args) {
 int SaveInfo(const std::vector<std::string> &args) {
   std::string config, agentPath, manifestPath;
   long long installError = 0, counter = 0;
-  for (size_t i = 0; i < args.size(); i++) {
-    const std::string &a = args[i];
-    bool hasValue = i + 1 < args.size();
-    if (IsHelp(a)) {
-      std::fputs(kSaveUsage, stdout);
-      return 0;
-    } else if (a == "--agent-xml" && hasValue) {
-      agentPath = args[++i];
-    } else if (a == "--manifest" && hasValue) {
-      manifestPath = args[++i];
-    } else if ((a == "--install-error" || a == "--counter") && hasValue) {
-      if (!ParseInt(args[++i], INT32_MIN, INT32_MAX, a == "--counter" ? &counter : &installError)) {
-        return UsageError(kSaveCmd, a + " needs a 32-bit number");
-      }
-    } else if (a.size() > 1 && a[0] == '-') {
-      return UsageError(kSaveCmd, "unknown option or missing value '" + a + "'");
-    } else if (config.empty()) {
-      config = a;
-    } else {
-      return UsageError(kSaveCmd, "more than one VMCONFIG");
-    }
-  }
+  int parsed = ArgParser(kSaveCmd, [] { std::fputs(kSaveUsage, stdout); })
+                   .Value("--agent-xml", &agentPath)
+                   .Value("--manifest", &manifestPath)
+                   .Value("--install-error", IntOption(INT32_MIN, INT32_MAX, &installError,
+                                                       "--install-error needs a 32-bit number"))
+                   .Value("--counter", IntOption(INT32_MIN, INT32_MAX, &counter,
+                                                 "--counter needs a 32-bit number"))
+                   .Positional(ArgParser::Single(&config, "VMCONFIG"))
+                   .Parse(args);
+  if (parsed >= 0) return parsed;
   if (config.empty()) return UsageError(kSaveCmd, "VMCONFIG is missing");
   std::string agent, manifest;
   for (auto [path, text] : {std::pair{&agentPath, &agent}, std::pair{&manifestPath, &manifest}}) {

@@ -9,6 +9,7 @@
 #include <string>
 #include <vector>
 
+#include "arg_parser.h"
 #include "command_group.h"
 #include "json.h"
 #include "progress.h"
@@ -139,23 +140,12 @@ int Verify(const std::vector<std::string> &args) {
   bool json = false, quiet = false;
   std::string cert;
   std::vector<std::string> pos;
-  for (size_t i = 0; i < args.size(); i++) {
-    const std::string &a = args[i];
-    if (IsHelp(a)) {
-      std::fputs(kVerifyUsage, stdout);
-      return 0;
-    } else if (a == "--json") {
-      json = true;
-    } else if (a == "--quiet") {
-      quiet = true;
-    } else if (a == "--cert" && i + 1 < args.size()) {
-      cert = args[++i];
-    } else if (a.size() > 1 && a[0] == '-') {
-      return UsageError("tools verify", "unknown option '" + a + "'");
-    } else {
-      pos.push_back(a);
-    }
-  }
+  int parsed = ArgParser("tools verify", [] { std::fputs(kVerifyUsage, stdout); })
+                   .Flag("--json", &json)
+                   .Flag("--quiet", &quiet)
+                   .Value("--cert", &cert)
+                   .Parse(args, &pos);
+  if (parsed >= 0) return parsed;
   if (pos.size() != 1) return UsageError("tools verify", "one IMAGE or URL is needed");
   Verified v;
   if (int rc = OpenOrExplain(pos[0], cert, &v)) return rc;
@@ -203,19 +193,10 @@ constexpr const char *kCatUsage =
 int Cat(const std::vector<std::string> &args) {
   std::string cert;
   std::vector<std::string> pos;
-  for (size_t i = 0; i < args.size(); i++) {
-    const std::string &a = args[i];
-    if (IsHelp(a)) {
-      std::fputs(kCatUsage, stdout);
-      return 0;
-    } else if (a == "--cert" && i + 1 < args.size()) {
-      cert = args[++i];
-    } else if (a.size() > 1 && a[0] == '-') {
-      return UsageError("tools cat", "unknown option '" + a + "'");
-    } else {
-      pos.push_back(a);
-    }
-  }
+  int parsed = ArgParser("tools cat", [] { std::fputs(kCatUsage, stdout); })
+                   .Value("--cert", &cert)
+                   .Parse(args, &pos);
+  if (parsed >= 0) return parsed;
   if (pos.size() != 2) return UsageError("tools cat", "IMAGE and PATH are needed");
   Verified v;
   if (int rc = OpenOrExplain(pos[0], cert, &v)) return rc;

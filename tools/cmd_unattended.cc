@@ -4,6 +4,7 @@
 #include <string>
 #include <vector>
 
+#include "arg_parser.h"
 #include "command_group.h"
 #include "json.h"
 #include "tvx_autoinstall.h"
@@ -51,23 +52,12 @@ std::string Flags(const Bool *flags, int n, const char *sep) {
 int Support(const std::vector<std::string> &args) {
   bool json = false;
   std::string image, family;
-  for (size_t i = 0; i < args.size(); ++i) {
-    const std::string &a = args[i];
-    if (IsHelp(a)) {
-      PrintSupportHelp(stdout);
-      return 0;
-    } else if (a == "--json") {
-      json = true;
-    } else if (a == "--family" && i + 1 < args.size()) {
-      family = args[++i];
-    } else if (!a.empty() && a[0] == '-') {
-      return UsageError(kSupportCmd, "unknown option '" + a + "'");
-    } else if (image.empty()) {
-      image = a;
-    } else {
-      return UsageError(kSupportCmd, "more than one IMAGE");
-    }
-  }
+  int parsed = ArgParser(kSupportCmd, [] { PrintSupportHelp(stdout); })
+                   .Flag("--json", &json)
+                   .Value("--family", &family)
+                   .Positional(ArgParser::Single(&image, "IMAGE"))
+                   .Parse(args);
+  if (parsed >= 0) return parsed;
   if (image.empty()) return UsageError(kSupportCmd, "IMAGE is missing");
   if (!family.empty() && family != "windows" && family != "linux") {
     return UsageError(kSupportCmd, "--family must be windows or linux");

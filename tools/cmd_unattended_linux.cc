@@ -10,6 +10,7 @@
 #include <system_error>
 #include <vector>
 
+#include "arg_parser.h"
 #include "command.h"
 #include "command_group.h"
 #include "json.h"
@@ -83,38 +84,12 @@ int Parse(const std::vector<std::string> &args, Options *o) {
   enum { kUser, kFullName, kPassword, kPasswordFile, kRoot, kRootFile, kKey, kOut };
   const std::pair<const char *, bool *> flags[] = {
       {"--json", &o->json}, {"--power-off", &o->powerOff}, {"--nvme", &o->nvme}};
+  ArgParser parser(kName, PrintHelp);
+  for (Valued &v : valued) parser.Value(v.flag, v.value, &v.given);
+  for (const auto &[flag, value] : flags) parser.Flag(flag, value);
+  AddLinuxMediaOptions(&parser, &o->media);
   std::vector<std::string> positional;
-  for (size_t i = 0; i < args.size(); ++i) {
-    const std::string &a = args[i];
-    if (IsHelp(a)) {
-      PrintHelp();
-      return 0;
-    }
-    bool known = false;
-    for (const auto &[flag, value] : flags) {
-      if (a == flag) *value = known = true;
-    }
-    for (Valued &v : valued) {
-      if (known) break;
-      std::string flag = v.flag;
-      if (a == flag) {
-        if (i + 1 >= args.size()) return UsageError(kName, a + " needs a value");
-        *v.value = args[++i];
-      } else if (a.rfind(flag + "=", 0) == 0) {
-        *v.value = a.substr(flag.size() + 1);
-      } else {
-        continue;
-      }
-      v.given = known = true;
-    }
-    if (known) continue;
-    if (int taken = TakeLinuxMediaOption(kName, args, &i, &o->media)) {
-      if (taken != 1) return taken;
-      continue;
-    }
-    if (a.size() > 1 && a[0] == '-') return UsageError(kName, "unknown option '" + a + "'");
-    positional.push_back(a);
-  }
+  if (int rc = parser.Parse(args, &positional); rc >= 0) return rc;
   if (positional.size() != 1) return UsageError(kName, "expected exactly one IMAGE");
   o->image = positional[0];
   for (int required : {kUser, kFullName, kOut}) {

@@ -7,6 +7,7 @@
 #include <string>
 #include <vector>
 
+#include "arg_parser.h"
 #include "command.h"
 #include "command_group.h"
 #include "json.h"
@@ -58,29 +59,14 @@ int Run(const std::vector<std::string> &args) {
   std::string guestOS, version, isolinuxBin, out;
   bool json = false;
   std::vector<std::string> positional;
-  for (size_t i = 0; i < args.size(); ++i) {
-    const std::string &a = args[i];
-    if (IsHelp(a)) {
-      PrintHelp();
-      return 0;
-    }
-    if (a == "--json") {
-      json = true;
-      continue;
-    }
-    std::string *value = a == "--guest-os"       ? &guestOS
-                         : a == "--version"      ? &version
-                         : a == "--isolinux-bin" ? &isolinuxBin
-                         : a == "--out"          ? &out
-                                                 : nullptr;
-    if (value != nullptr) {
-      if (i + 1 >= args.size()) return UsageError(kName, a + " needs a value");
-      *value = args[++i];
-      continue;
-    }
-    if (a.size() > 1 && a[0] == '-') return UsageError(kName, "unknown option '" + a + "'");
-    positional.push_back(a);
-  }
+  int parsed = ArgParser(kName, PrintHelp)
+                   .Flag("--json", &json)
+                   .Value("--guest-os", &guestOS)
+                   .Value("--version", &version)
+                   .Value("--isolinux-bin", &isolinuxBin)
+                   .Value("--out", &out)
+                   .Parse(args, &positional);
+  if (parsed >= 0) return parsed;
   if (positional.size() != 1) return UsageError(kName, "expected exactly one IMAGE or TREE");
   if (out.empty()) return UsageError(kName, "--out is required");
   const std::string &medium = positional[0];

@@ -5,6 +5,7 @@
 #include <string>
 #include <vector>
 
+#include "arg_parser.h"
 #include "command_group.h"
 #include "json.h"
 #include "tvx_autoinstall.h"
@@ -46,29 +47,14 @@ void PrintHelp(FILE *out) {
 int Validate(const std::vector<std::string> &args) {
   bool json = false, haveText = false;
   std::string image, family, kind, text;
-  for (size_t i = 0; i < args.size(); ++i) {
-    const std::string &a = args[i];
-    bool hasValue = i + 1 < args.size();
-    if (IsHelp(a)) {
-      PrintHelp(stdout);
-      return 0;
-    } else if (a == "--json") {
-      json = true;
-    } else if (a == "--family" && hasValue) {
-      family = args[++i];
-    } else if (a == "--kind" && hasValue) {
-      kind = args[++i];
-    } else if (a == "--text" && hasValue) {
-      text = args[++i];
-      haveText = true;
-    } else if (!a.empty() && a[0] == '-') {
-      return UsageError(kCmd, "unknown option or missing value '" + a + "'");
-    } else if (image.empty()) {
-      image = a;
-    } else {
-      return UsageError(kCmd, "more than one IMAGE");
-    }
-  }
+  int parsed = ArgParser(kCmd, [] { PrintHelp(stdout); })
+                   .Flag("--json", &json)
+                   .Value("--family", &family)
+                   .Value("--kind", &kind)
+                   .Value("--text", &text, &haveText)
+                   .Positional(ArgParser::Single(&image, "IMAGE"))
+                   .Parse(args);
+  if (parsed >= 0) return parsed;
   if (image.empty()) return UsageError(kCmd, "IMAGE is missing");
   if (!haveText) return UsageError(kCmd, "--text is missing");
   if (!family.empty() && family != "windows" && family != "linux") {

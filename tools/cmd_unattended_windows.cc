@@ -10,6 +10,7 @@
 #include <utility>
 #include <vector>
 
+#include "arg_parser.h"
 #include "command.h"
 #include "json.h"
 #include "tvx_autoinstall.h"
@@ -65,68 +66,26 @@ struct Options {
 
 // Parse fills `o`; returns -1 to go on, else the exit status.
 int Parse(const std::vector<std::string> &args, Options *o) {
-  struct Valued {
-    const char *flag;
-    std::string *value;
-    bool *given;
-  };
   std::string passwordFile;
-  bool havePasswordFile = false, ignored = false;
-  const Valued valued[] = {
-      {"--sif", &o->sif, &ignored},
-      {"--xml", &o->xml, &ignored},
-      {"--storepwd", &o->storePwd, &o->haveStorePwd},
-      {"--image-name", &o->imageName, &ignored},
-      {"--full-name", &o->fullName, &ignored},
-      {"--password", &o->password, &o->havePassword},
-      {"--password-file", &passwordFile, &havePasswordFile},
-      {"--product-key", &o->productKey, &o->haveKey},
-      {"--language", &o->language, &o->haveLanguage},
-      {"--out", &o->out, &ignored},
-  };
+  bool havePasswordFile = false, noAutoLogon = false;
+  ArgParser parser(kName, PrintHelp);
+  parser.Value("--sif", &o->sif)
+      .Value("--xml", &o->xml)
+      .Value("--storepwd", &o->storePwd, &o->haveStorePwd)
+      .Value("--image-name", &o->imageName)
+      .Value("--full-name", &o->fullName)
+      .Value("--password", &o->password, &o->havePassword)
+      .Value("--password-file", &passwordFile, &havePasswordFile)
+      .Value("--product-key", &o->productKey, &o->haveKey)
+      .Value("--language", &o->language, &o->haveLanguage)
+      .Value("--out", &o->out)
+      .Flag("--json", &o->json)
+      .Flag("--no-autologon", &noAutoLogon)
+      .Flag("--keep-partitions", &o->keepPartitions);
+  o->floppy.AddTo(&parser);
   std::vector<std::string> positional;
-  for (size_t i = 0; i < args.size(); ++i) {
-    const std::string &a = args[i];
-    if (IsHelp(a)) {
-      PrintHelp();
-      return 0;
-    }
-    if (a == "--json") {
-      o->json = true;
-      continue;
-    }
-    if (a == "--no-autologon") {
-      o->autoLogon = false;
-      continue;
-    }
-    if (a == "--keep-partitions") {
-      o->keepPartitions = true;
-      continue;
-    }
-    if (int r = o->floppy.Take(kName, args, &i); r != WindowsFloppyOptions::kNotMine) {
-      if (r >= 0) return r;
-      continue;
-    }
-    if (a.size() > 1 && a[0] == '-') {
-      bool known = false;
-      for (const Valued &v : valued) {
-        std::string flag = v.flag;
-        if (a == flag) {
-          if (i + 1 >= args.size()) return UsageError(kName, a + " needs a value");
-          *v.value = args[++i];
-        } else if (a.rfind(flag + "=", 0) == 0) {
-          *v.value = a.substr(flag.size() + 1);
-        } else {
-          continue;
-        }
-        *v.given = known = true;
-        break;
-      }
-      if (!known) return UsageError(kName, "unknown option '" + a + "'");
-      continue;
-    }
-    positional.push_back(a);
-  }
+  if (int rc = parser.Parse(args, &positional); rc >= 0) return rc;
+  o->autoLogon = !noAutoLogon;
   if (positional.size() != 1) return UsageError(kName, "expected exactly one IMAGE");
   o->image = positional[0];
   const std::pair<const std::string *, const char *> required[] = {

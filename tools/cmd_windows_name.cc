@@ -4,6 +4,7 @@
 #include <string>
 #include <vector>
 
+#include "arg_parser.h"
 #include "command.h"
 #include "json.h"
 #include "tvx_autoinstall.h"
@@ -16,25 +17,17 @@ constexpr const char *kCmd = "windows-name";
 int Run(const std::vector<std::string> &args) {
   bool json = false;
   std::vector<std::string> raws;
-  for (const std::string &a : args) {
-    if (IsHelp(a)) {
-      std::printf(
-          "Usage: tvxguest windows-name [--json] \"RAW NAME\"...\n\n"
-          "Turns the raw name of a Windows image (base name, a space, the edition key,\n"
-          "as in \"Windows 10 ENTERPRISEN\") into its localised display name, one line\n"
-          "per name. Unknown editions come back unchanged.\n\n"
-          "Options:\n"
-          "  --json       print one JSON object per name: {\"raw\", \"pretty\"}\n"
-          "  -h, --help   show this help\n");
-      return 0;
-    } else if (a == "--json") {
-      json = true;
-    } else if (a.size() > 1 && a[0] == '-' && a[1] == '-') {
-      return UsageError(kCmd, "unknown option '" + a + "'");
-    } else {
-      raws.push_back(a);
-    }
-  }
+  auto help = [] {
+    std::printf(
+        "Usage: tvxguest windows-name [--json] \"RAW NAME\"...\n\n"
+        "Turns the raw name of a Windows image (base name, a space, the edition key,\n"
+        "as in \"Windows 10 ENTERPRISEN\") into its localised display name, one line\n"
+        "per name. Unknown editions come back unchanged.\n\n"
+        "Options:\n"
+        "  --json       print one JSON object per name: {\"raw\", \"pretty\"}\n"
+        "  -h, --help   show this help\n");
+  };
+  if (int rc = ArgParser(kCmd, help).Flag("--json", &json).Parse(args, &raws); rc >= 0) return rc;
   if (raws.empty()) return UsageError(kCmd, "RAW NAME is missing");
   for (const std::string &raw : raws) {
     char *pretty = AutoInstall_GetPrettyWindowsName(raw.c_str());

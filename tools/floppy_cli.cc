@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <filesystem>
 
+#include "arg_parser.h"
 #include "command.h"
 #include "tvx_fat.h"
 #include "tvx_floppy.h"
@@ -23,34 +24,13 @@ const char *FatErrorText(unsigned long code) {
   }
 }
 
-int WindowsFloppyOptions::Take(const char *cmd, const std::vector<std::string> &args, size_t *i) {
-  const std::string &a = args[*i];
-  if (a == "--floppy") {
-    wanted = true;
-    return kTaken;
-  }
-  struct Valued {
-    const char *flag;
-    std::string *value;
-  };
-  const Valued valued[] = {
-      {"--base-floppy", &base},        {"--tools-iso", &toolsIso},
-      {"--scsi-dir", &scsiDir},        {"--upgrader-dir", &upgraderDir},
-      {"--resource-dir", &resourceDir},
-  };
-  for (const Valued &v : valued) {
-    std::string flag = v.flag;
-    if (a == flag) {
-      if (*i + 1 >= args.size()) return UsageError(cmd, a + " needs a value");
-      *v.value = args[++*i];
-      return kTaken;
-    }
-    if (a.rfind(flag + "=", 0) == 0) {
-      *v.value = a.substr(flag.size() + 1);
-      return kTaken;
-    }
-  }
-  return kNotMine;
+void WindowsFloppyOptions::AddTo(ArgParser *parser) {
+  parser->Flag("--floppy", &wanted)
+      .Value("--base-floppy", &base)
+      .Value("--tools-iso", &toolsIso)
+      .Value("--scsi-dir", &scsiDir)
+      .Value("--upgrader-dir", &upgraderDir)
+      .Value("--resource-dir", &resourceDir);
 }
 
 int WindowsFloppyOptions::Check(const char *cmd) const {

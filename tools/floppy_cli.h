@@ -7,6 +7,8 @@
 
 namespace tvxcli {
 
+class ArgParser;
+
 // FatErrorText names a FAT result code.
 const char *FatErrorText(unsigned long code);
 
@@ -16,10 +18,8 @@ struct WindowsFloppyOptions {
   bool wanted = false;
   std::string base, toolsIso, scsiDir, upgraderDir, resourceDir;
 
-  static constexpr int kNotMine = -2, kTaken = -1;
-  // Take consumes args[*i] (and its value) when it is one of the floppy
-  // options: kTaken, kNotMine, or an exit status for a usage error.
-  int Take(const char *cmd, const std::vector<std::string> &args, size_t *i);
+  // AddTo lets `parser` fill these from the command line.
+  void AddTo(ArgParser *parser);
   // Check runs after parsing: an exit status for a usage error, else -1.
   int Check(const char *cmd) const;
   // Make builds the floppy in `outDir` from the answer files there.

@@ -7,11 +7,12 @@
 #include <cstdlib>
 #include <filesystem>
 
+#include "arg_parser.h"
 #include "command.h"
+#include "staged_output.h"
 #include "tvx_autoinstall.h"
 #include "tvx_autoinstall_linux_media.h"
 #include "tvx_log.h"
-#include "staged_output.h"
 
 namespace tvxcli {
 
@@ -22,27 +23,12 @@ const char kLinuxMediaHelp[] =
     "  --floppy-templates DIR  suse.flp and mandriva.flp for SUSE and Mandriva\n"
     "  --tools DIR           guest-tools installer files to put on the boot CD\n";
 
-int TakeLinuxMediaOption(const char *cmd, const std::vector<std::string> &args, size_t *i,
-                         LinuxMediaOptions *o) {
-  const std::pair<const char *, std::string *> valued[] = {
-      {"--media", &o->mediaDir},          {"--mkisofs", &o->mkisofs},
-      {"--isolinux-bin", &o->isolinuxBin}, {"--floppy-templates", &o->templateDir},
-      {"--tools", &o->toolsDir},
-  };
-  const std::string &a = args[*i];
-  for (const auto &[flag, value] : valued) {
-    std::string f = flag;
-    if (a == f) {
-      if (*i + 1 >= args.size()) return UsageError(cmd, a + " needs a value");
-      *value = args[++*i];
-      return 1;
-    }
-    if (a.rfind(f + "=", 0) == 0) {
-      *value = a.substr(f.size() + 1);
-      return 1;
-    }
-  }
-  return 0;
+void AddLinuxMediaOptions(ArgParser *parser, LinuxMediaOptions *o) {
+  parser->Value("--media", &o->mediaDir)
+      .Value("--mkisofs", &o->mkisofs)
+      .Value("--isolinux-bin", &o->isolinuxBin)
+      .Value("--floppy-templates", &o->templateDir)
+      .Value("--tools", &o->toolsDir);
 }
 
 std::string DefaultMkisofs() {

@@ -11,6 +11,8 @@
 
 namespace tvxcli {
 
+class ArgParser;
+
 struct LinuxMediaOptions {
   std::string mediaDir;     // --media: where autoinst.iso / autoinst.flp go
   std::string mkisofs;      // --mkisofs (empty: DefaultMkisofs())
@@ -19,11 +21,8 @@ struct LinuxMediaOptions {
   std::string toolsDir;     // --tools: guest-tools installer files for the CD
 };
 
-// TakeLinuxMediaOption consumes the media option at args[*i] ("--media DIR"
-// or "--media=DIR", ...): 1 taken, 0 not a media option, or the exit status
-// of a usage error (64) for a missing value.
-int TakeLinuxMediaOption(const char *cmd, const std::vector<std::string> &args, size_t *i,
-                         LinuxMediaOptions *o);
+// AddLinuxMediaOptions lets `parser` fill `o` from the command line.
+void AddLinuxMediaOptions(ArgParser *parser, LinuxMediaOptions *o);
 
 // The help lines of the media options.
 extern const char kLinuxMediaHelp[];
