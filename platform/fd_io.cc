@@ -6,39 +6,38 @@
 
 namespace tvx {
 
-bool WriteAll(int fd, const void *data, size_t len) {
+namespace {
+
+// WriteLoop calls `write_some(bytes, count, done)` until every byte is out.
+// A write that makes no progress is an I/O error, not a reason to spin.
+template <typename WriteSome>
+bool WriteLoop(const void *data, size_t len, WriteSome write_some) {
   const char *p = static_cast<const char *>(data);
-  while (len > 0) {
-    ssize_t n = ::write(fd, p, len);
+  for (size_t done = 0; done < len;) {
+    ssize_t n = write_some(p + done, len - done, done);
     if (n < 0 && errno == EINTR) continue;
     if (n < 0) return false;
     if (n == 0) {
       errno = EIO;
       return false;
     }
-    p += n;
-    len -= static_cast<size_t>(n);
+    done += static_cast<size_t>(n);
   }
   return true;
+}
+
+}  // namespace
+
+bool WriteAll(int fd, const void *data, size_t len) {
+  return WriteLoop(data, len, [fd](const char *p, size_t n, size_t) { return ::write(fd, p, n); });
 }
 
 bool WriteAll(int fd, std::string_view data) { return WriteAll(fd, data.data(), data.size()); }
 
 bool PwriteAll(int fd, const void *data, size_t len, uint64_t offset) {
-  const char *p = static_cast<const char *>(data);
-  while (len > 0) {
-    ssize_t n = ::pwrite(fd, p, len, static_cast<off_t>(offset));
-    if (n < 0 && errno == EINTR) continue;
-    if (n < 0) return false;
-    if (n == 0) {
-      errno = EIO;
-      return false;
-    }
-    p += n;
-    len -= static_cast<size_t>(n);
-    offset += static_cast<uint64_t>(n);
-  }
-  return true;
+  return WriteLoop(data, len, [fd, offset](const char *p, size_t n, size_t done) {
+    return ::pwrite(fd, p, n, static_cast<off_t>(offset + done));
+  });
 }
 
 bool PreadAll(int fd, void *buf, size_t len, uint64_t offset, size_t *out_count) {
