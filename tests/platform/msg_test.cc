@@ -81,17 +81,4 @@ TEST(MsgCatalogue, LocaleHitMissAndFaultyTranslations) {
   Msg_SetLocale("");
 }
 
-TEST(MsgCatalogue, MalformedCatalogueIsRefusedWithItsLine) {
-  tvxtest::TempDir t;
-  std::string path = t.Join("bad.txt");
-  tvxtest::WriteFileOrDie(path, "msg.a = \"ok\"\nmsg.b \"no equals\"\n");
-  Take(Msg_GetMessagesAndReset());
-  EXPECT_FALSE(Msg_LoadCatalogue("xx", path.c_str()));
-  EXPECT_EQ(Take(Msg_GetMessagesAndReset()),
-            "cannot load message catalogue \"" + path + "\": line 2: \"=\" expected after \"msg.b\"");
-  Msg_SetLocale("xx");
-  EXPECT_EQ(Take(Msg_GetString("@&!*@*@(msg.a)default")), "default");
-  Msg_SetLocale("");
-}
-
 }  // namespace
