@@ -98,7 +98,6 @@ TEST(UdfBuilt, ReadsEveryLayout) {
     UdfBuildOptions opt;
   } cases[] = {
       {"1.02 short_ad", {}},
-      {"long_ad", {.longAds = true}},
       {"extended entries", {.extendedEntries = true}},
       {"embedded data", {.metadataPartition = true, .embedSmallFiles = true}},
       {"allocation extent chains",
