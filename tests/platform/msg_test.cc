@@ -65,14 +65,9 @@ TEST(MsgCatalogue, LocaleHitMissAndFaultyTranslations) {
                           "msg.swapped = \"%s sur %d\"\n");
   ASSERT_TRUE(Msg_LoadCatalogue("fr", path.c_str()));
   Msg_SetLocale("fr");
-  struct Case {
-    const char *id;
-    std::string want;
-  } cases[] = {
-      {"@&!*@*@(msg.guessGuest.ubuntuServer)Server", "Serveur"},
-      {"@&!*@*@(msg.guessGuest.sledDesktop)Desktop", "Desktop"},  // not translated
-  };
-  for (const auto &c : cases) EXPECT_EQ(Take(Msg_GetString(c.id)), c.want) << c.id;
+  EXPECT_EQ(Take(Msg_GetString("@&!*@*@(msg.guessGuest.ubuntuServer)Server")), "Serveur");
+  // An id the catalogue lacks keeps its default text.
+  EXPECT_EQ(Take(Msg_GetString("@&!*@*@(msg.guessGuest.sledDesktop)Desktop")), "Desktop");
   EXPECT_EQ(Take(Msg_Format("@&!*@*@(msg.count)%d of %s", 3, "five")), "3 sur five");
   // A translation whose conversions differ would read the wrong arguments.
   EXPECT_EQ(Take(Msg_Format("@&!*@*@(msg.swapped)%d of %s", 3, "five")), "3 of five");
