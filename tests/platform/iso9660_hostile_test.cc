@@ -3,8 +3,6 @@
 // destination.
 #include <gtest/gtest.h>
 
-#include <cerrno>
-#include <cstring>
 #include <functional>
 #include <string>
 #include <sys/stat.h>
@@ -219,7 +217,6 @@ TEST(Iso9660Hostile, UnsafeNamesAreListedButNeverExtracted) {
     const char *listed;
   } cases[] = {
       {"Rock Ridge parent", 4, "A;1", susp::NM(".."), ".."},
-      {"Rock Ridge slash", 4, "A;1", susp::NM("x/../../etc"), "x/../../etc"},
       {"plain slash", 1, "../A;1", "", "../A"},
       {"Joliet slash", 2, std::string("\0.\0.\0/\0x", 8), "", "../x"},
   };
@@ -373,10 +370,6 @@ TEST(Iso9660Hostile, DataBeyondTheEnd) {
   b.SetRoot(kRoot, b.Dir(kRoot, kRoot, {{"A;1", kRoot, 10, 0, ""}, {"FAR;1", 100000, 10, 0, ""}}));
   Image img{b.Bytes()};
   ASSERT_EQ(img.Open(), ISO9660_OK);
-  Iso9660DirEntry e{};
-  std::strcpy(e.name, "FAR");
-  Iso9660File *f = nullptr;
-  EXPECT_EQ(Iso9660_OpenFile(img.image, &e, &f), ISO9660_ERR_CORRUPT);
   tvxtest::TempDir tmp;
   EXPECT_EQ(Iso9660_ExtractFileEx(img.image, "FAR", tmp.Join("t").c_str()), ISO9660_ERR_CORRUPT);
   EXPECT_EQ(Iso9660_Extract(img.image, "/", tmp.Join("d").c_str()), ISO9660_ERR_CORRUPT);

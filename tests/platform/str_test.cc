@@ -91,19 +91,6 @@ TEST(StrUtil, NumberConversionsRefuseJunkAndOverflow) {
   }
 }
 
-TEST(StrUtil, DecimalStrToUintAdvancesOnlyOnSuccess) {
-  const char *s = "10.2";
-  unsigned int v = 0;
-  EXPECT_TRUE(StrUtil_DecimalStrToUint(&v, &s));
-  EXPECT_EQ(v, 10u);
-  EXPECT_STREQ(s, ".2");
-  EXPECT_FALSE(StrUtil_DecimalStrToUint(&v, &s));
-  EXPECT_STREQ(s, ".2");
-  const char *big = "4294967296x";
-  EXPECT_FALSE(StrUtil_DecimalStrToUint(&v, &big));
-  EXPECT_STREQ(big, "4294967296x");
-}
-
 TEST(Str, SnprintfReportsCuts) {
   char buf[6];
   EXPECT_EQ(Str_Snprintf(buf, sizeof buf, "%s", "12345"), 5);
