@@ -29,7 +29,6 @@ struct ZoneCase {
 
 const ZoneCase kZones[] = {
     {"Europe/Berlin", "W. Europe Standard Time", 110},
-    {"UTC", "UTC", 90},
     // Forms of $TZ: a leading colon, a path into a zoneinfo tree, an alias.
     {":Europe/London", "GMT Standard Time", 85},
     {"/usr/share/zoneinfo/America/New_York", "Eastern Standard Time", 35},

@@ -277,7 +277,6 @@ TEST(UdfHostile, DirectoryLoopAndDeepNestingAreBounded) {
   UDFVolume *vol = OpenUdfBytes(img, &closes);
   ASSERT_NE(vol, nullptr);
   EXPECT_EQ(UDF_OpenDir(vol, nullptr, "loop"), nullptr);
-  EXPECT_EQ(UDF_OpenDir(vol, nullptr, "loop/loop/loop"), nullptr);
   EXPECT_TRUE(log.Contains("UDF: directory structure contains a loop\n"));
   UDF_Close(vol);
 
