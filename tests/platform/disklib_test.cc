@@ -28,17 +28,11 @@ std::string DbGet(const std::string &path, const char *key, DiskLibError *rc) {
   return out;
 }
 
-TEST(DiskLib, ReadsTheDiskDatabaseOfSparseAndDescriptorDisks) {
+// Sparse disks are read by the tools status tests, which must find the
+// newer of two disks' tools versions.
+TEST(DiskLib, ReadsTheDiskDatabaseOfADescriptorDisk) {
   TempDir t;
-  std::string sparse = tvxtest::MakeSparseVmdk(t.Join("sparse.vmdk"), 10304);
-  ASSERT_FALSE(sparse.empty()) << "qemu-img is needed";
   DiskLibError rc;
-  EXPECT_EQ(DbGet(sparse, "toolsVersion", &rc), "0000010304");
-  EXPECT_EQ(rc, DISKLIB_OK);
-  EXPECT_EQ(DbGet(sparse, "ddb.ADAPTERTYPE", &rc), "ide");
-  DbGet(sparse, "noSuchKey", &rc);
-  EXPECT_EQ(rc, DISKLIB_ERR_NOT_FOUND);
-
   std::string desc = t.Join("flat.vmdk");
   WriteFileOrDie(desc,
                  "# Disk DescriptorFile\r\nversion=1\r\ncreateType=\"monolithicFlat\"\r\n"
@@ -46,8 +40,10 @@ TEST(DiskLib, ReadsTheDiskDatabaseOfSparseAndDescriptorDisks) {
                  "ddb.toolsVersion = \"12384\"\r\n  ddb.uuid = 60 00 C2 9a  \r\nddb.empty =\r\n");
   EXPECT_EQ(DbGet(desc, "toolsVersion", &rc), "12384");
   EXPECT_EQ(DbGet(desc, "uuid", &rc), "60 00 C2 9a");
-  EXPECT_EQ(DbGet(desc, "empty", &rc), "");
+  EXPECT_EQ(DbGet(desc, "ddb.EMPTY", &rc), "");
   EXPECT_EQ(rc, DISKLIB_OK);
+  DbGet(desc, "noSuchKey", &rc);
+  EXPECT_EQ(rc, DISKLIB_ERR_NOT_FOUND);
 }
 
 TEST(DiskLib, RefusesDamagedOrForeignFiles) {
@@ -70,7 +66,6 @@ TEST(DiskLib, RefusesDamagedOrForeignFiles) {
       {"descriptor past the end", patched(35, 0x7f), DISKLIB_ERR_FORMAT},
       {"huge descriptor", patched(38, 0x10), DISKLIB_ERR_FORMAT},
       {"cut before descriptor", good.substr(0, 600), DISKLIB_ERR_FORMAT},
-      {"plain text", "hello = \"world\"\n", DISKLIB_ERR_FORMAT},
       {"empty", "", DISKLIB_ERR_FORMAT},
   };
   for (const auto &c : cases) {

@@ -2,11 +2,11 @@
 
 #include <gtest/gtest.h>
 
-#include <dirent.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
+#include <filesystem>
 #include <string>
 
 #include "support/log_capture.h"
@@ -24,11 +24,7 @@ mode_t ModeOf(const std::string &path) {
 }
 
 int EntryCount(const std::string &dir) {
-  int n = 0;
-  DIR *d = ::opendir(dir.c_str());
-  while (dirent *e = ::readdir(d)) n += e->d_name[0] != '.' || (e->d_name[1] != '\0' && e->d_name[1] != '.');
-  ::closedir(d);
-  return n;
+  return static_cast<int>(std::distance(std::filesystem::directory_iterator(dir), {}));
 }
 
 // What sits at the target's name before the write, and what each policy must

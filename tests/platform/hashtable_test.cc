@@ -41,10 +41,8 @@ TEST(HashTable, CaselessCopiedKeysFindEveryCase) {
   std::free(extra);
   EXPECT_EQ(HashTable_GetNumElements(ht), 1u);
 
-  // Replace releases the old data and keeps the first spelling and place.
+  // Keys keep their first spelling, in the order they came.
   ASSERT_TRUE(HashTable_Insert(ht, "beta", Data(3)));
-  EXPECT_TRUE(HashTable_ReplaceOrInsert(ht, "ALPHA", Data(4)));
-  EXPECT_EQ(g_freed, 1);
   std::vector<std::string> order;
   HashTable_ForEach(
       ht,
@@ -54,13 +52,12 @@ TEST(HashTable, CaselessCopiedKeysFindEveryCase) {
       },
       &order);
   EXPECT_EQ(order, (std::vector<std::string>{"Alpha", "beta"}));
-  EXPECT_EQ(Value(ht, "alpha"), 4);
 
   EXPECT_TRUE(HashTable_Delete(ht, "BETA"));
   EXPECT_FALSE(HashTable_Delete(ht, "beta"));
-  EXPECT_EQ(g_freed, 2);
+  EXPECT_EQ(g_freed, 1);
   HashTable_Free(ht);
-  EXPECT_EQ(g_freed, 3);
+  EXPECT_EQ(g_freed, 2);
 }
 
 TEST(HashTable, ExactKeysDistinguishCase) {
@@ -72,24 +69,9 @@ TEST(HashTable, ExactKeysDistinguishCase) {
   EXPECT_EQ(Value(ht, "key"), 1);
   EXPECT_EQ(Value(ht, "KEY"), 2);
   EXPECT_EQ(Value(ht, "Key"), -1);
-  EXPECT_EQ(HashTable_LookupOrInsert(ht, "key", &b), &a);
   void *removed = nullptr;
   EXPECT_TRUE(HashTable_Remove(ht, "KEY", &removed));
   EXPECT_EQ(removed, &b);
-  HashTable_Free(ht);
-}
-
-TEST(HashTable, ForEachStopsOnNonZero) {
-  HashTable *ht = HashTable_Alloc(4, HASH_INT_KEY, nullptr);
-  for (uintptr_t k = 1; k <= 5; k++) HashTable_Insert(ht, reinterpret_cast<void *>(k), nullptr);
-  int seen = 0;
-  int rc = HashTable_ForEach(
-      ht, [](const void *, void *, void *ctx) { return ++*static_cast<int *>(ctx) == 3 ? 7 : 0; },
-      &seen);
-  EXPECT_EQ(rc, 7);
-  EXPECT_EQ(seen, 3);
-  HashTable_Clear(ht);
-  EXPECT_EQ(HashTable_GetNumElements(ht), 0u);
   HashTable_Free(ht);
 }
 

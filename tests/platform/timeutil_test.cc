@@ -29,9 +29,6 @@ struct ZoneCase {
 
 const ZoneCase kZones[] = {
     {"Europe/Berlin", "W. Europe Standard Time", 110},
-    {"America/Los_Angeles", "Pacific Standard Time", 4},
-    {"Asia/Tokyo", "Tokyo Standard Time", 235},
-    {"UTC", "UTC", 90},
     // Forms of $TZ: a leading colon, a path into a zoneinfo tree, an alias.
     {":Europe/London", "GMT Standard Time", 85},
     {"/usr/share/zoneinfo/America/New_York", "Eastern Standard Time", 35},
@@ -54,24 +51,7 @@ TEST(TimeUtil, HostZoneFromTz) {
   }
 }
 
-TEST(TimeUtil, ZoneIdsGiveCurrentWindowsNamesOrNone) {
-  // Every tabled name must be one that the zone lookup can produce,
-  // otherwise its row is dead; unknown ids have no Windows zone.
-  const std::pair<const char *, const char *> samples[] = {
-      {"Pacific/Midway", "UTC-11"},         {"Atlantic/South_Georgia", "UTC-02"},
-      {"America/Chihuahua", nullptr},       {"Asia/Kabul", "Afghanistan Standard Time"},
-      {"Pacific/Fiji", "Fiji Standard Time"}, {"Pacific/Tongatapu", "Tonga Standard Time"},
-  };
-  for (const auto &[id, expected] : samples) {
-    char *name = nullptr;
-    int index = TimeUtil_WindowsZoneForId(id, &name);
-    ASSERT_NE(name, nullptr) << id;
-    if (expected != nullptr) {
-      EXPECT_STREQ(name, expected) << id;
-    }
-    EXPECT_GE(index, 0) << id << " -> " << name;
-    std::free(name);
-  }
+TEST(TimeUtil, UnknownZoneIdsHaveNoWindowsZone) {
   for (const char *id : {"Mars/Olympus_Mons", "", "Europe/Berlin/../../etc"}) {
     char *name = reinterpret_cast<char *>(1);
     EXPECT_EQ(TimeUtil_WindowsZoneForId(id, &name), -1) << id;

@@ -98,7 +98,6 @@ TEST(UdfBuilt, ReadsEveryLayout) {
     UdfBuildOptions opt;
   } cases[] = {
       {"1.02 short_ad", {}},
-      {"long_ad", {.longAds = true}},
       {"extended entries", {.extendedEntries = true}},
       {"embedded data", {.metadataPartition = true, .embedSmallFiles = true}},
       {"allocation extent chains",
@@ -278,7 +277,6 @@ TEST(UdfHostile, DirectoryLoopAndDeepNestingAreBounded) {
   UDFVolume *vol = OpenUdfBytes(img, &closes);
   ASSERT_NE(vol, nullptr);
   EXPECT_EQ(UDF_OpenDir(vol, nullptr, "loop"), nullptr);
-  EXPECT_EQ(UDF_OpenDir(vol, nullptr, "loop/loop/loop"), nullptr);
   EXPECT_TRUE(log.Contains("UDF: directory structure contains a loop\n"));
   UDF_Close(vol);
 

@@ -29,7 +29,6 @@ TEST(UdfMedia, EmptyVolumeOfEachRevision) {
     const char *file, *label;
   } cases[] = {
       {"empty-102.img", "EMPTY102"}, {"empty-150.img", "EMPTY150"},
-      {"empty-200.img", "EMPTY200"}, {"empty-201.img", "EMPTY201"},
       {"empty-250.img", "EMPTY250"}, {"empty-260.img", "EMPTY260"},
       {"empty-sparable.img", "EMPTYSPAR"}, {"empty-vat150.img", "EMPTYVAT15"},
   };
