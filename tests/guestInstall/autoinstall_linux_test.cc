@@ -33,18 +33,6 @@ const std::string kHostileName = "Jo \"JJ\" O'Neil & Co <x> Zo\xc3\xab \xe7\x8e\
 const std::string kHostilePassword = "$(touch x)`touch x`\"'\\@{[`touch x`]}%s";
 const std::string kRootPassword = "r00t ${HOME} @ARGV \\\" ]]> \xc3\xa9";
 
-struct Ran {
-  int status = -1;
-  std::string out;
-};
-
-// RunIn starts argv (no shell) in `cwd` and collects its standard output.
-Ran RunIn(const std::vector<std::string> &argv, const std::string &cwd) {
-  Ran r;
-  r.status = tvxtest::RunArgv(argv, &r.out, {.cwd = cwd.c_str()});
-  return r;
-}
-
 std::vector<std::string> Lines(const std::string &text) {
   std::vector<std::string> out;
   std::stringstream ss(text);
@@ -67,7 +55,7 @@ std::string After(const std::string &text, const std::string &prefix) {
 // ShellAccepts: `sh -n` on a script written into `dir`.
 bool ShellAccepts(const std::string &dir, const std::string &script) {
   std::ofstream(dir + "/script.sh") << script;
-  return RunIn({"sh", "-n", "script.sh"}, dir).status == 0;
+  return tvxtest::RunArgv({"sh", "-n", "script.sh"}, nullptr, {.cwd = dir.c_str()}) == 0;
 }
 
 // The preseed tools scripts: the lines after each "..._command string \"
@@ -113,6 +101,7 @@ class LinuxAnswers : public ::testing::Test {
 TEST_F(LinuxAnswers, HostileTextsStayIntactAndInert) {
   const std::string names[] = {kHostileName, "$(touch x) `touch x` @{[`touch x`]} ${HOME}",
                                "a ]]> b \\ c % d %s", "  spaced  "};
+  const tvxtest::RunOptions in{.cwd = dir_.Path().c_str()};
   for (const std::string &name : names) {
     SCOPED_TRACE(name);
     // Red Hat: %post passes sh -n; the chfn line, run by sh, gives the name.
@@ -123,8 +112,9 @@ TEST_F(LinuxAnswers, HostileTextsStayIntactAndInert) {
     post = post.substr(0, post.rfind("%end"));
     EXPECT_TRUE(ShellAccepts(dir_.Path(), post));
     std::string chfn = After(ks.text, "/usr/bin/chfn ");
-    Ran r = RunIn({"sh", "-c", "chfn() { printf '%s' \"$2\"; }; chfn " + chfn}, dir_.Path());
-    EXPECT_EQ(r.out, name);
+    std::string out;
+    tvxtest::RunArgv({"sh", "-c", "chfn() { printf '%s' \"$2\"; }; chfn " + chfn}, &out, in);
+    EXPECT_EQ(out, name);
     EXPECT_EQ(tvxtest::SystemCrypt(kRootPassword, After(ks.text, "rootpw --iscrypted ")),
               After(ks.text, "rootpw --iscrypted "));
     std::string usermod = After(ks.text, "/usr/sbin/usermod -p '");
@@ -135,9 +125,10 @@ TEST_F(LinuxAnswers, HostileTextsStayIntactAndInert) {
     Prepared ps = Prepare("ubuntu-64", GUESS_VERSION_UBUNTU_1504_TO_2004, name, nullptr, FALSE,
                           FALSE, "jo", kHostilePassword, kRootPassword);
     ASSERT_TRUE(ps.ok);
-    EXPECT_EQ(RunIn({"debconf-set-selections", "-c", ps.path}, dir_.Path()).status, 0);
+    EXPECT_EQ(tvxtest::RunArgv({"debconf-set-selections", "-c", ps.path}, nullptr, in), 0);
     EXPECT_EQ(After(ps.text, "ubiquity   passwd/user-fullname string   "), name);
     std::string crypted = After(ps.text, "ubiquity   passwd/user-password-crypted password ");
+    EXPECT_EQ(crypted.size(), 63u) << "\"$5$\", a 16-character salt, '$' and 43";
     EXPECT_EQ(tvxtest::SystemCrypt(kHostilePassword, crypted), crypted);
     for (const auto &script : PreseedScripts(ps.text)) {
       EXPECT_TRUE(ShellAccepts(dir_.Path(), script));
@@ -162,13 +153,14 @@ TEST_F(LinuxAnswers, HostileTextsStayIntactAndInert) {
     Prepared mi = Prepare("mandriva-64", GUESS_VERSION_MANDRIVA_2008_1_OR_HIGHER, name, nullptr,
                           FALSE, FALSE, "jo", kHostilePassword, kRootPassword);
     ASSERT_TRUE(mi.ok);
-    EXPECT_EQ(RunIn({"perl", "-c", mi.path}, dir_.Path()).status, 0);
-    Ran perl = RunIn({"perl", "-e",
+    EXPECT_EQ(tvxtest::RunArgv({"perl", "-c", mi.path}, nullptr, in), 0);
+    out.clear();
+    tvxtest::RunArgv({"perl", "-e",
                       "our $o; do $ARGV[0] or die; print join(\"\\0\", $o->{users}[0]{realname}, "
                       "$o->{users}[0]{password}, $o->{superuser}{password}, $o->{security_user})",
                       mi.path},
-                     dir_.Path());
-    EXPECT_EQ(perl.out, name + '\0' + kHostilePassword + '\0' + kRootPassword + '\0' + "jo");
+                     &out, in);
+    EXPECT_EQ(out, name + '\0' + kHostilePassword + '\0' + kRootPassword + '\0' + "jo");
     EXPECT_FALSE(fs::exists(dir_.Path() + "/x")) << "a typed text ran as code";
   }
 }
