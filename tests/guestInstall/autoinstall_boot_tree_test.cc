@@ -65,7 +65,6 @@ TEST(IsolinuxConfig, FirstCompleteEntry) {
       {"indented label is not a label", "  label a\n kernel k\n append initrd=i\n", false, "", "",
        ""},
       {"keyword without value", "label a\n kernel \n append initrd=i\n", false, "", "", ""},
-      {"empty text", "", false, "", "", ""},
   };
   for (const ParseCase &c : cases) {
     BootEntry e;

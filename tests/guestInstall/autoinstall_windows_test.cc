@@ -11,6 +11,7 @@
 
 #include "support/unattend_xml.h"
 #include "support/log_capture.h"
+#include "tvx_autoinstall.h"
 #include "tvx_autoinstall_windows.h"
 #include "tvx_ini.h"
 
@@ -300,8 +301,6 @@ TEST_F(WindowsAnswers, FailuresLogTheirStepAndStop) {
     std::vector<std::string> files;  // left in the output directory
   };
   const Case cases[] = {
-      {"unknown guest", [&](Answers &a) { a.guestOS = "winFoo"; },
-       "GuestOS_IsWin failed for guestID winFoo\n", {}},
       {"no guest", [&](Answers &a) { a.guestOS = nullptr; },
        "GuestOS_IsWin failed for guestID (null)\n", {}},
       {"sif template missing", [&](Answers &a) { a.sif = missing; },
@@ -361,6 +360,35 @@ TEST_F(WindowsAnswers, FailuresLogTheirStepAndStop) {
     std::sort(files.begin(), files.end());
     EXPECT_EQ(files, c.files);
   }
+}
+
+// Display names of Windows images: prefix, edition key and modifier interplay.
+TEST(WindowsPrettyName, KeysAndModifiers) {
+  const struct {
+    const char *raw, *pretty;
+  } cases[] = {
+      {"Windows 7 ULTIMATE", "Windows 7 Ultimate"},
+      {"Windows Longhorn SERVERSTANDARD", "Windows Server 2008 Standard"},
+      {"Windows 10 ENTERPRISEN", "Windows 10 Enterprise N"},
+      // "SERVERSTANDARDA" finds CORE; the later "SERVERSTANDARD" finds no
+      // modifier for "ACORE" and keeps it.
+      {"Windows Server 2008 R2 SERVERSTANDARDACORE", "Windows Server 2008 R2 Standard Core"},
+      {"Windows Server 2008 R2 SERVERDATACENTERAVCORE",
+       "Windows Server 2008 R2 Datacenter Core without Hyper-V"},
+      // A key followed by an unknown rest still names the edition.
+      {"Windows 7 ULTIMATEXYZ", "Windows 7 Ultimate"},
+      // Unchanged: no edition key, no space, prefix that is not exact.
+      {"Windows 7 ultimate", "Windows 7 ultimate"},
+      {"ULTIMATE", "ULTIMATE"},
+      {"windows longhorn SERVERWEB", "windows longhorn Web Edition"},
+  };
+  for (const auto &c : cases) {
+    char *pretty = AutoInstall_GetPrettyWindowsName(c.raw);
+    ASSERT_NE(nullptr, pretty) << c.raw;
+    EXPECT_STREQ(c.pretty, pretty) << c.raw;
+    std::free(pretty);
+  }
+  EXPECT_EQ(nullptr, AutoInstall_GetPrettyWindowsName(nullptr));
 }
 
 }  // namespace
