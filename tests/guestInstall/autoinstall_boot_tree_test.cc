@@ -7,6 +7,7 @@
 #include <string>
 
 #include "lib/guestInstall/autoinstall_linux_media_internal.h"
+#include "support/fat_oracle.h"
 #include "support/log_capture.h"
 #include "tvx_autoinstall_linux_media.h"
 
@@ -64,7 +65,6 @@ TEST(IsolinuxConfig, FirstCompleteEntry) {
       {"indented label is not a label", "  label a\n kernel k\n append initrd=i\n", false, "", "",
        ""},
       {"keyword without value", "label a\n kernel \n append initrd=i\n", false, "", "", ""},
-      {"empty text", "", false, "", "", ""},
   };
   for (const ParseCase &c : cases) {
     BootEntry e;
@@ -240,6 +240,65 @@ TEST(AddToolsLinux, StopsAtTheFirstMissingFile) {
   Put(tools.Join("tarvex-tools-upgrader-64"), "64");
   EXPECT_TRUE(AutoInstall_AddTools_Linux(dest.Path().c_str(), tools.Path().c_str()));
   EXPECT_EQ(ReadFileOrDie(dest.Join("upgrade.sh")), "sh");
+}
+
+// A template floppy as a distribution ships it: already holding a driver.
+void MakeTemplate(const std::string &path) {
+  tvxtest::TestFloppy f;
+  ASSERT_EQ(f.Open(path, true), 0u);
+  f.Close();
+  ASSERT_TRUE(tvxtest::MtoolsWrite(path, "driver.img", "driver bytes"));
+}
+
+struct FloppyCase {
+  const char *guestOS;
+  const char *answerPath;  // where the answer file was prepared, "" for none
+  const char *nameOnFloppy;
+  bool fromTemplate;
+  bool ok, image;
+  const char *log;
+};
+
+TEST(MakeFloppyImgLinux, AnswerFileOnTheGuestsFloppy) {
+  const FloppyCase cases[] = {
+      {"sles10-64", "autoinst.xml", "autoinst.xml", true, true, true, ""},
+      {"mandriva", "auto_i~1.cfg", "auto_i~1.cfg", true, true, true, ""},
+      {"centos7-64", "ks.cfg", "", false, true, false, ""},
+      {"sles15-64", "autoinst.xml", "", false, true, false, ""},
+      {"ubuntu-64", "preseed.cfg", "", false, false, false, ""},  // not in custom/
+      {"sles11-64", "", "", true, false, false, ""},
+      {"mandriva", "auto_i~1.cfg", "", false, false, false,
+       "AutoInstall_MakeFloppyImg_Linux: !File_Exists failed templatePath=\""},
+  };
+  for (const FloppyCase &c : cases) {
+    TempDir answers, floppies, templates;
+    std::string answer = std::string("answer for ") + c.guestOS;
+    if (*c.answerPath != '\0') Put(answers.Join(c.answerPath), answer);
+    if (c.fromTemplate) {
+      MakeTemplate(templates.Join("suse.flp"));
+      MakeTemplate(templates.Join("mandriva.flp"));
+    }
+    tvxtest::LogCapture log;
+    std::string label = std::string(c.guestOS) + " " + c.answerPath;
+    EXPECT_EQ(AutoInstall_MakeFloppyImg_Linux(answers.Path().c_str(), floppies.Path().c_str(),
+                                              templates.Path().c_str(), c.guestOS),
+              c.ok)
+        << label << log.All();
+    if (*c.log != '\0') {
+      EXPECT_TRUE(log.Contains(c.log)) << label << log.All();
+    } else {
+      EXPECT_EQ(log.All(), "") << label;
+    }
+    std::string image = floppies.Join("autoinst.flp");
+    ASSERT_EQ(fs::exists(image), c.image) << label;
+    if (!c.image) continue;
+    EXPECT_EQ(tvxtest::FatProblems(image), "") << label;
+    std::string data;
+    ASSERT_TRUE(tvxtest::MtoolsRead(image, c.nameOnFloppy, &data)) << label;
+    EXPECT_EQ(data, answer) << label;
+    EXPECT_EQ(tvxtest::MtoolsNames(image).count("driver.img"), c.fromTemplate ? 1u : 0u) << label;
+  }
+  EXPECT_FALSE(AutoInstall_NeedsFloppy_Linux(nullptr));
 }
 
 }  // namespace

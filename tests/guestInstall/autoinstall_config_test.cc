@@ -1,6 +1,8 @@
-// Support queries and answer limits per guest family.
+// Support queries, answer limits and the validation of typed answers per
+// guest family, with their messages.
 #include <gtest/gtest.h>
 
+#include <cstdlib>
 #include <cstring>
 
 #include "lib/guestInstall/autoinstall_internal.h"
@@ -45,7 +47,6 @@ TEST(AutoInstallConfig, RefusalsLeaveInfoUntouched) {
   std::memset(&info, 0x5A, sizeof info);
   before = info;
   EXPECT_FALSE(AutoInstall_GetInstallConfigInfo("Windows", &g, &info));  // family is exact
-  EXPECT_FALSE(AutoInstall_GetInstallConfigInfo("solaris", &g, &info));
   EXPECT_FALSE(AutoInstall_GetInstallConfigInfo(nullptr, &g, &info));
   EXPECT_FALSE(AutoInstall_GetInstallConfigInfo("windows", &none, &info));
   EXPECT_FALSE(AutoInstall_GetInstallConfigInfo("windows", nullptr, &info));
@@ -77,7 +78,6 @@ TEST(AutoInstallSupport, PerFamily) {
       {"winXPPro", GUESS_VERSION_UNKNOWN, TRUE},
       {"windows9-64", GUESS_VERSION_WINDOWS_10_TRIAL, TRUE},
       {"windows9-64", GUESS_VERSION_WINDOWS_10_ESD, FALSE},
-      {"windows2019srv-64", GUESS_VERSION_UNKNOWN, TRUE},
       {"win2000Pro", GUESS_VERSION_UNKNOWN, FALSE},
   };
   for (const auto &c : cases) {
@@ -87,18 +87,77 @@ TEST(AutoInstallSupport, PerFamily) {
   }
 }
 
-TEST(AutoInstallLinuxKind, Prefixes) {
+enum Kind { kPassword, kShortName, kName };
+
+AutoInstallTextError Validate(const char *family, const GuessResult *g, const char *text, Kind k,
+                              char **msg) {
+  switch (k) {
+    case kPassword:
+      return AutoInstall_ValidatePassword(family, g, text, msg);
+    case kShortName:
+      return AutoInstall_ValidateShortName(family, g, text, msg);
+    case kName:
+      return AutoInstall_ValidateName(family, g, text, msg);
+  }
+  return AUTOINSTALL_TEXT_OK;
+}
+
+const char kLinuxNameMsg[] =
+    "The full name does not allow the following characters: ':\"\\,'\nEnter a new value.";
+const char kPasswordMsg[] =
+    "The password must not contain the characters ']]>' in a row.\nEnter a new value.";
+const char kGecosMsg[] =
+    "The full name must not contain the characters ']]>' in a row.\nEnter a new value.";
+const char kLinuxUserMsg[] =
+    "The user name must consist only of lowercase US English characters, numbers 0 to 9 and "
+    "dashes.\nEnter a new value.";
+const char kUbuntuUserMsg[] =
+    "The user name must start with a lowercase US English character.\nEnter a new value.";
+const char kWindowsNameMsg[] =
+    "The name must not contain the following characters:\n'/\\[]\":;|<>+=,?*'\n"
+    "Enter a new value.";
+
+TEST(AutoInstallValidate, TextsPerFamilyAndKind) {
   const struct {
-    const char *guestOS;
-    AutoInstallLinuxKind kind;
+    const char *family, *guestOS, *text;
+    Kind kind;
+    AutoInstallTextError error;
+    const char *message;  // null: the slot stays untouched
   } cases[] = {
-      {"rhel7-64", AUTOINSTALL_LINUX_REDHAT},   {"sles10-64", AUTOINSTALL_LINUX_SLES10},
-      {"sles11", AUTOINSTALL_LINUX_SUSE},       {"ubuntu-64", AUTOINSTALL_LINUX_UBUNTU},
-      {"mandriva", AUTOINSTALL_LINUX_MANDRIVA}, {"sles15-64", AUTOINSTALL_LINUX_NONE},
-      {"Ubuntu", AUTOINSTALL_LINUX_NONE},       {nullptr, AUTOINSTALL_LINUX_NONE},
+      {"linux", "rhel8-64", "9lives", kShortName, AUTOINSTALL_TEXT_OK, nullptr},
+      {"linux", "rhel8-64", "Bob", kShortName, AUTOINSTALL_TEXT_BAD_LINUX_USERNAME, kLinuxUserMsg},
+      {"linux", "ubuntu-64", "9lives", kShortName, AUTOINSTALL_TEXT_BAD_UBUNTU_USERNAME,
+       kUbuntuUserMsg},
+      {"linux", "ubuntu-64", "", kShortName, AUTOINSTALL_TEXT_BAD_UBUNTU_USERNAME,
+       kUbuntuUserMsg},
+      {"linux", "ubuntu-64", "bob-2", kShortName, AUTOINSTALL_TEXT_OK, nullptr},
+      {"linux", "ubuntu-64", "bOb", kShortName, AUTOINSTALL_TEXT_BAD_LINUX_USERNAME,
+       kLinuxUserMsg},
+      {"linux", "rhel8-64", "Doe, John", kName, AUTOINSTALL_TEXT_BAD_LINUX_NAME, kLinuxNameMsg},
+      {"linux", "rhel8-64", "x]]>y", kName, AUTOINSTALL_TEXT_BAD_GECOS_SUBSTRING, kGecosMsg},
+      {"linux", "rhel8-64", "x]]>y,", kName, AUTOINSTALL_TEXT_BAD_LINUX_NAME, kLinuxNameMsg},
+      {"linux", "rhel8-64", "Jane O'Doe", kName, AUTOINSTALL_TEXT_OK, nullptr},
+      {"linux", "rhel8-64", "p]]>w", kPassword, AUTOINSTALL_TEXT_BAD_PASSWORD_SUBSTRING,
+       kPasswordMsg},
+      {"linux", "rhel8-64", "a:b,c\\\"", kPassword, AUTOINSTALL_TEXT_OK, nullptr},
+      {"windows", "winXPPro", "Doe, John", kName, AUTOINSTALL_TEXT_BAD_WINDOWS_NAME,
+       kWindowsNameMsg},
+      {"windows", "winXPPro", "Doe, John", kPassword, AUTOINSTALL_TEXT_OK, nullptr},
+      {"windows", "winXPPro", "Bob", kShortName, AUTOINSTALL_TEXT_OK, nullptr},
+      {"windows", "windows9-64", "J.-Doe_(x)!@#$%^&'~`{}", kName, AUTOINSTALL_TEXT_OK, nullptr},
   };
   for (const auto &c : cases) {
-    EXPECT_EQ(c.kind, AutoInstallGetLinuxKind(c.guestOS)) << (c.guestOS ? c.guestOS : "(null)");
+    GuessResult g = Guess(c.guestOS);
+    char *msg = nullptr;
+    EXPECT_EQ(c.error, Validate(c.family, &g, c.text, c.kind, &msg))
+        << c.family << " " << c.kind << " '" << c.text << "'";
+    EXPECT_EQ(c.message != nullptr, msg != nullptr) << c.text;
+    if (c.message != nullptr && msg != nullptr) {
+      EXPECT_STREQ(c.message, msg) << c.text;
+    }
+    std::free(msg);
+    // Without a slot the verdict is the same.
+    EXPECT_EQ(c.error, Validate(c.family, &g, c.text, c.kind, nullptr)) << c.text;
   }
 }
 

@@ -4,7 +4,6 @@
 // prove them inert, the kickstart and AutoYaST choices per version class,
 // and what a failing call leaves behind.
 #include <gtest/gtest.h>
-#include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -33,18 +32,6 @@ const std::string kHostileName = "Jo \"JJ\" O'Neil & Co <x> Zo\xc3\xab \xe7\x8e\
 const std::string kHostilePassword = "$(touch x)`touch x`\"'\\@{[`touch x`]}%s";
 const std::string kRootPassword = "r00t ${HOME} @ARGV \\\" ]]> \xc3\xa9";
 
-struct Ran {
-  int status = -1;
-  std::string out;
-};
-
-// RunIn starts argv (no shell) in `cwd` and collects its standard output.
-Ran RunIn(const std::vector<std::string> &argv, const std::string &cwd) {
-  Ran r;
-  r.status = tvxtest::RunArgv(argv, &r.out, {.cwd = cwd.c_str()});
-  return r;
-}
-
 std::vector<std::string> Lines(const std::string &text) {
   std::vector<std::string> out;
   std::stringstream ss(text);
@@ -67,7 +54,7 @@ std::string After(const std::string &text, const std::string &prefix) {
 // ShellAccepts: `sh -n` on a script written into `dir`.
 bool ShellAccepts(const std::string &dir, const std::string &script) {
   std::ofstream(dir + "/script.sh") << script;
-  return RunIn({"sh", "-n", "script.sh"}, dir).status == 0;
+  return tvxtest::RunArgv({"sh", "-n", "script.sh"}, nullptr, {.cwd = dir.c_str()}) == 0;
 }
 
 // The preseed tools scripts: the lines after each "..._command string \"
@@ -113,6 +100,7 @@ class LinuxAnswers : public ::testing::Test {
 TEST_F(LinuxAnswers, HostileTextsStayIntactAndInert) {
   const std::string names[] = {kHostileName, "$(touch x) `touch x` @{[`touch x`]} ${HOME}",
                                "a ]]> b \\ c % d %s", "  spaced  "};
+  const tvxtest::RunOptions in{.cwd = dir_.Path().c_str()};
   for (const std::string &name : names) {
     SCOPED_TRACE(name);
     // Red Hat: %post passes sh -n; the chfn line, run by sh, gives the name.
@@ -123,8 +111,9 @@ TEST_F(LinuxAnswers, HostileTextsStayIntactAndInert) {
     post = post.substr(0, post.rfind("%end"));
     EXPECT_TRUE(ShellAccepts(dir_.Path(), post));
     std::string chfn = After(ks.text, "/usr/bin/chfn ");
-    Ran r = RunIn({"sh", "-c", "chfn() { printf '%s' \"$2\"; }; chfn " + chfn}, dir_.Path());
-    EXPECT_EQ(r.out, name);
+    std::string out;
+    tvxtest::RunArgv({"sh", "-c", "chfn() { printf '%s' \"$2\"; }; chfn " + chfn}, &out, in);
+    EXPECT_EQ(out, name);
     EXPECT_EQ(tvxtest::SystemCrypt(kRootPassword, After(ks.text, "rootpw --iscrypted ")),
               After(ks.text, "rootpw --iscrypted "));
     std::string usermod = After(ks.text, "/usr/sbin/usermod -p '");
@@ -135,9 +124,10 @@ TEST_F(LinuxAnswers, HostileTextsStayIntactAndInert) {
     Prepared ps = Prepare("ubuntu-64", GUESS_VERSION_UBUNTU_1504_TO_2004, name, nullptr, FALSE,
                           FALSE, "jo", kHostilePassword, kRootPassword);
     ASSERT_TRUE(ps.ok);
-    EXPECT_EQ(RunIn({"debconf-set-selections", "-c", ps.path}, dir_.Path()).status, 0);
+    EXPECT_EQ(tvxtest::RunArgv({"debconf-set-selections", "-c", ps.path}, nullptr, in), 0);
     EXPECT_EQ(After(ps.text, "ubiquity   passwd/user-fullname string   "), name);
     std::string crypted = After(ps.text, "ubiquity   passwd/user-password-crypted password ");
+    EXPECT_EQ(crypted.size(), 63u) << "\"$5$\", a 16-character salt, '$' and 43";
     EXPECT_EQ(tvxtest::SystemCrypt(kHostilePassword, crypted), crypted);
     for (const auto &script : PreseedScripts(ps.text)) {
       EXPECT_TRUE(ShellAccepts(dir_.Path(), script));
@@ -162,13 +152,14 @@ TEST_F(LinuxAnswers, HostileTextsStayIntactAndInert) {
     Prepared mi = Prepare("mandriva-64", GUESS_VERSION_MANDRIVA_2008_1_OR_HIGHER, name, nullptr,
                           FALSE, FALSE, "jo", kHostilePassword, kRootPassword);
     ASSERT_TRUE(mi.ok);
-    EXPECT_EQ(RunIn({"perl", "-c", mi.path}, dir_.Path()).status, 0);
-    Ran perl = RunIn({"perl", "-e",
+    EXPECT_EQ(tvxtest::RunArgv({"perl", "-c", mi.path}, nullptr, in), 0);
+    out.clear();
+    tvxtest::RunArgv({"perl", "-e",
                       "our $o; do $ARGV[0] or die; print join(\"\\0\", $o->{users}[0]{realname}, "
                       "$o->{users}[0]{password}, $o->{superuser}{password}, $o->{security_user})",
                       mi.path},
-                     dir_.Path());
-    EXPECT_EQ(perl.out, name + '\0' + kHostilePassword + '\0' + kRootPassword + '\0' + "jo");
+                     &out, in);
+    EXPECT_EQ(out, name + '\0' + kHostilePassword + '\0' + kRootPassword + '\0' + "jo");
     EXPECT_FALSE(fs::exists(dir_.Path() + "/x")) << "a typed text ran as code";
   }
 }
@@ -347,7 +338,6 @@ TEST_F(LinuxAnswers, FailuresLeaveNothingBehind) {
   } kCases[] = {
       {"unknown guest", "windows9-64", "jo", "Jo", "p", "r", nullptr, ""},
       {"null user", "rhel7-64", nullptr, "Jo", "p", "r", nullptr, ""},
-      {"null root password for Ubuntu", "ubuntu-64", "jo", "Jo", "p", nullptr, nullptr, ""},
       {"user with shell code", "rhel7-64", "jo;reboot", "Jo", "p", "r", nullptr,
        "the user name is refused: only a-z, 0-9 and '-' are allowed\n"},
       {"Ubuntu user with a digit first", "ubuntu-64", "9lives", "Jo", "p", "r", nullptr,
@@ -403,19 +393,6 @@ TEST_F(LinuxAnswers, FailuresLeaveNothingBehind) {
                                                      (dir_.Path() + "/plainfile/sub").c_str(), "jo",
                                                      "Jo", "p", "r", nullptr, FALSE, 0, FALSE));
   EXPECT_EQ(tvxtest::ReadFileOrDie(dir_.Path() + "/plainfile"), "x");
-}
-
-// A rewrite replaces the whole file and keeps it private.
-TEST_F(LinuxAnswers, RewriteTruncatesAndStaysPrivate) {
-  Prepared first = Prepare("mandriva-64", 0, std::string(500, 'n'));
-  ASSERT_TRUE(first.ok);
-  Prepared second = Prepare("mandriva-64", 0, "Jo");
-  ASSERT_TRUE(second.ok);
-  EXPECT_LT(second.text.size(), first.text.size());
-  EXPECT_EQ(second.text.substr(second.text.size() - 3), "};\n");
-  struct stat st {};
-  ASSERT_EQ(stat(second.path.c_str(), &st), 0);
-  EXPECT_EQ(st.st_mode & 07777, 0600u);
 }
 
 }  // namespace
