@@ -25,14 +25,12 @@ TEST(ToolsVersionNumber, ParsesAndFormats) {
     const char *rest;
     const char *formatted;
   } cases[] = {
-      {"11.2.5", true, "", "11.2.5.0"},
       {"11.2.5.1234#4", true, "", "11.2.5.1234#4"},
       {"11#1", true, "", "11.0.0.0#1"},
       {"1.2.3.4.5.6", true, "", "1.2.3.4"},  // a fifth number is read and dropped
       {"1.2#9", true, "", "1.2.0.0#4"},      // precision limited to 4
       {"1.2.3.4#0", true, "", ""},           // not set
       {"1.2.3x", true, "x", "1.2.3.0"},
-      {"1.2.3 ", true, " ", "1.2.3.0"},
       {"1.2.", false, "", ""},
       {"1.2#", false, "", ""},
       {"x1", false, "", ""},
@@ -131,9 +129,6 @@ const StatusCase kStatusCases[] = {
     {"monolithic too new above the maximum", "monolithic.version = 11.1.0\n",
      "monolithic.version_max = 11.1#2\n", "monolithic.version = 11.2.0\n", TOOLS_STATUS_TOO_NEW,
      "M=too new", "Status is too new because this is status of monolithic version."},
-    {"monolithic current", "monolithic.version = 11.1.0.7#3\n", nullptr,
-     "monolithic.version = 11.1.0.9\n", TOOLS_STATUS_CURRENT, "M=current",
-     "Status is current because this is status of monolithic version."},
     {"illegal with precision 0 matches every version", "monolithic.version = 1.0\n",
      "monolithic.version_illegal = 3#0\n", "monolithic.version = 5.5\n", TOOLS_STATUS_BLACKLISTED,
      "M=blacklisted", "Status is blacklisted because this is status of monolithic version."},
