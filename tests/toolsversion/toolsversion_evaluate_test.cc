@@ -2,9 +2,7 @@
 // from hand-written guest, host and AVR manifests.
 #include <gtest/gtest.h>
 
-#include <cstring>
 #include <string>
-#include <vector>
 
 #include "lib/toolsversion/toolsversion_internal.h"
 #include "support/log_capture.h"
@@ -194,32 +192,6 @@ TEST(ToolsVersionEvaluate, BucketsDecideTheStatus) {
     std::string line = c.reason[0] == '\0' ? "" : "ToolsVersion: " + std::string(c.reason) + "\n";
     EXPECT_EQ(log.All(), line);
   }
-}
-
-TEST(ToolsVersionEvaluate, LogSwitchesPrintTableAndLists) {
-  DictPtr host = Dict(
-      "components.log = true\nresult.log = true\nmonolithic.version = 2\n"
-      "a.version = 1\nb.version = 1\nc.version = 1\n");
-  DictPtr avr = Dict("a.version_illegal = 0.5, 0.6#2\n");
-  DictPtr guest = Dict("monolithic.version = 2\n");
-  LogSwitches switches;
-  TablePtr table = FillTable(host.get(), avr.get(), guest.get(), &switches);
-  tvxtest::LogCapture log;
-  EXPECT_EQ(EvaluateTable(table.get(), switches, nullptr), TOOLS_STATUS_CURRENT);
-  std::vector<std::string> want = {
-      "ToolsVersion: Component               : Status      Guest            I Host             "
-      "AVR Min          AVR Max          AVR Illegal\n",
-      "ToolsVersion: monolithic              : current     2.0.0.0          Y 2.0.0.0          "
-      "                                  \n",
-      "ToolsVersion: a                       : missing fro                  N 1.0.0.0          "
-      "                                  0.5.0.0, 0.6.0.0#2\n",
-      "ToolsVersion: b                       : missing fro                  N 1.0.0.0          "
-      "                                  \n",
-      "ToolsVersion: c                       : missing fro                  N 1.0.0.0          "
-      "                                  \n",
-      "ToolsVersion: missing from the guest  : (  3) a, b, and c\n",
-  };
-  EXPECT_EQ(log.Lines(), want);
 }
 
 }  // namespace
