@@ -25,12 +25,6 @@ using tvxtest::ReadFileOrDie;
 using tvxtest::TempDir;
 using tvxtest::WriteFileOrDie;
 
-void FlipByte(const std::string &path, uint64_t offset) {
-  std::string b = ReadFileOrDie(path);
-  b[offset] = static_cast<char>(b[offset] ^ 0x5a);
-  WriteFileOrDie(path, b);
-}
-
 class ToolsImageRead : public testing::Test {
  protected:
   void SetUp() override {
@@ -64,8 +58,9 @@ TEST_F(ToolsImageRead, FlippedByteFailsExactlyItsBlock) {
   ASSERT_EQ(pristine.size() % bs, 0u);
   for (uint64_t flipped : std::vector<uint64_t>{~0ull, 0ull, blocks / 2, blocks - 1}) {
     SCOPED_TRACE(flipped);
-    WriteFileOrDie(iso, pristine);
-    if (flipped != ~0ull) FlipByte(iso, flipped * bs + 1000);
+    std::string bytes = pristine;
+    if (flipped != ~0ull) bytes[flipped * bs + 1000] ^= 0x5a;
+    WriteFileOrDie(iso, bytes);
     ToolsIsoLocalFile *h = OpenOk(iso);
     ASSERT_NE(h, nullptr);
     std::vector<char> buf(bs);

@@ -23,19 +23,14 @@ using tvxtest::TempDir;
 using tvxtest::WriteFileOrDie;
 
 std::string Real(const std::string &path) {
-  char *r = ToolsISO_GetRealPath(path.c_str());
-  std::string s = r;
-  free(r);
-  return s;
+  return tvxtest::Take(ToolsISO_GetRealPath(path.c_str()));
 }
 
 // Choose returns the chosen image path, or "" when the call fails.
 std::string Choose(const std::string &dir, const char *guest, const char *hint = nullptr) {
   char *path = nullptr;
   if (!ToolsISO_GetImagePath(dir.c_str(), guest, hint, TRUE, &path, nullptr, nullptr)) return "";
-  std::string s = path;
-  free(path);
-  return s;
+  return tvxtest::Take(path);
 }
 
 enum class Map { kNone, kSigned, kUnsigned, kTampered, kMalformed };
@@ -91,7 +86,6 @@ TEST_F(ToolsImageSelect, ChoosesFromTableMapAndHint) {
     std::vector<std::string> logs;  // "%m" stands for the canonical map path
   } cases[] = {
       {"first row wins for winNT", Map::kNone, "winNT", nullptr, true, "winPre2k.iso", "winPre2k", 2, {}},
-      {"linux row", Map::kNone, "rhel6", nullptr, true, "linux.iso", "linux", 4, {}},
       {"hypervisor row has no image", Map::kNone, "zelcore", nullptr, true, nullptr, nullptr, 0, {}},
       {"id in no row", Map::kNone, "windows11-64", nullptr, true, nullptr, nullptr, 0, {}},
       {"hint from the table", Map::kNone, "windows9-64", "linux.iso", true, "linux.iso", "linux", 2, {}},
@@ -192,7 +186,6 @@ TEST_F(ToolsImageSelect, FirstToolsDirectoryStays) {
 // guest is given the Linux image). A hint neither reads nor fills the cache.
 TEST_F(ToolsImageSelect, CacheFollowsTheRefreshCount) {
   const std::string linux = Dir().Path() + "/isoimages/linux.iso";
-  EXPECT_EQ(ToolsISO_GetRefreshCount(), 1u);
   EXPECT_EQ(Choose(Dir().Path(), "rhel6"), linux);
   EXPECT_EQ(Choose(Dir().Path(), "windows9-64"), Dir().Path() + "/isoimages/windows.iso");
   ToolsISO_UpdateRefreshCount();
