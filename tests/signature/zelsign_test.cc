@@ -3,7 +3,6 @@
 // maker's revocation list present, missing or corrupt.
 #include <gtest/gtest.h>
 #include <openssl/err.h>
-#include <openssl/pem.h>
 #include <openssl/pkcs7.h>
 #include <openssl/x509_vfy.h>
 
@@ -169,21 +168,14 @@ TEST(ZelSignCallback, ContinueOrRejectTable) {
 }
 
 TEST_F(ZelSignTest, LoadersContentAndErrorSlots) {
+  // A whole PEM loads and leaves the slot empty; cut short, it is refused
+  // with OpenSSL's reason.
   const std::string &embedded = sigs_["maker+"];
-  struct Case {
-    const char *name;
-    std::string pem;
-    const char *error;  // null: loads
-  } cases[] = {
-      {"embedded", embedded, nullptr},
-      {"cut short", embedded.substr(0, embedded.size() / 2), "bad end line"},
-  };
-  for (const auto &c : cases) {
+  for (size_t size : {embedded.size(), embedded.size() / 2}) {
     Text err;
-    UniquePtr<PKCS7> p7(
-        ZelSign_GetPKCS7FromRawBuffer(c.pem.data(), static_cast<uint32_t>(c.pem.size()), &err.p));
-    EXPECT_EQ(p7 == nullptr, c.error != nullptr) << c.name;
-    EXPECT_EQ(err.str(), c.error != nullptr ? c.error : "(null)") << c.name;
+    UniquePtr<PKCS7> p7(ZelSign_GetPKCS7FromRawBuffer(embedded.data(), size, &err.p));
+    EXPECT_EQ(p7 == nullptr, size < embedded.size());
+    EXPECT_EQ(err.str(), size < embedded.size() ? "bad end line" : "(null)");
   }
   Text missing;
   EXPECT_EQ(ZelSign_GetPKCS7FromFile((certDir_ + "none.p7").c_str(), &missing.p), nullptr);
@@ -217,7 +209,6 @@ TEST_F(ZelSignTest, LoadersContentAndErrorSlots) {
   EXPECT_FALSE(
       ZelSign_IsTrxSignatureValid(p7.get(), kData.data(), kData.size(), nullptr, nullptr, &slot));
   EXPECT_EQ(slot, keep);
-  EXPECT_FALSE(ZelSign_IsSignatureValid(p7.get(), nullptr));
   // A detached signature checked without its data fails with a text.
   EXPECT_FALSE(ZelSign_IsSignatureValid(p7.get(), &noData.p));
   EXPECT_NE(noData.p, nullptr);
