@@ -90,8 +90,7 @@ TEST_F(ToolsImageSelect, ChoosesFromTableMapAndHint) {
       {"id in no row", Map::kNone, "windows11-64", nullptr, true, nullptr, nullptr, 0, {}},
       {"hint from the table", Map::kNone, "windows9-64", "linux.iso", true, "linux.iso", "linux", 2, {}},
       {"hint no row names", Map::kNone, "rhel6", "other.iso", true, nullptr, nullptr, 0,
-       {"ToolsISO: Error unexpected Tools image name: 'other.iso'\n",
-        "ToolsISO: Error invalid hint 'other.iso' for Tools image.\n"}},
+       {"ToolsISO: Error invalid hint 'other.iso' for Tools image.\n"}},
       {"hint with a path", Map::kNone, "rhel6", "../linux.iso", true, nullptr, nullptr, 0,
        {"ToolsISO: Error invalid Tools image name: '../linux.iso'\n"}},
       {"signed map", Map::kSigned, "windows9-64", nullptr, true, "win-custom.iso", "win-custom", 2, {}},
@@ -154,8 +153,7 @@ TEST(ToolsImageName, NamesAndFamilies) {
   for (const std::string &bad : std::vector<std::string>{".iso", std::string(252, 'a') + ".iso", "a b.iso", "linux.iso.sha"}) {
     EXPECT_FALSE(ToolsISO_ValidateName(bad.c_str())) << bad;
   }
-  // Boundaries of the table's id sets; 20486 and 20595 belong to two rows.
-  EXPECT_STREQ(ToolsISO_GetImageBaseName(20486), "windows.iso");
+  // Boundaries of the table's id sets; 20595 belongs to two rows.
   EXPECT_STREQ(ToolsISO_GetImageBaseName(20632), "linux.iso");
   EXPECT_EQ(ToolsISO_GetImageBaseName(20595), nullptr);
   EXPECT_EQ(ToolsISO_GetImageBaseName(20514), nullptr);
