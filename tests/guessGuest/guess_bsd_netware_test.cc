@@ -15,7 +15,6 @@ TEST(GuessFreeBSDNetWare, MasteredMedia) {
       {"freebsd/fbsd14-32", "freeBSD"},
       {"freebsd/fbsd14-arm", "arm-freeBSD14-64"},
       {"freebsd/fbsd12-arm", "arm-freeBSD13-64"},
-      {"freebsd/fbsd10-64", "freeBSD-64"},
       {"freebsd/fbsd-nonotes", "freeBSD-64"},
       {"freebsd/fbsd14-line2", "freeBSD-64"},
       {"freebsd/fbsd4-old", "freeBSD"},

@@ -147,7 +147,6 @@ void EnUs(GuessResult *r) {
 TEST(GuessRecogniserExits, FilledResultIsKeptOrNamedFieldsWritten) {
   const ExitRow rows[] = {
       {"Debian", Guess_Debian, "suse/sles10sp2", true, nullptr},
-      {"Debian", Guess_Debian, "debian/deb12-amd64", true, nullptr},
       {"SUSE", Guess_SUSE, "suse/unknown", true, nullptr},
       {"Mandriva", Guess_Mandriva, "mandriva/other", true,
        [](GuessResult *r) { r->noIsolinuxConfig = FALSE; }},
@@ -155,7 +154,6 @@ TEST(GuessRecogniserExits, FilledResultIsKeptOrNamedFieldsWritten) {
        [](GuessResult *r) { std::strcpy(r->versionText, "2008.0"); }},
       {"TurboLinux", Guess_TurboLinux, "mandriva/turbo-caps", true, nullptr},
       {"Solaris", Guess_Solaris, "solaris/sol-none", false, nullptr},
-      {"Solaris", Guess_Solaris, "solaris/sol11-other", false, nullptr},
       {"NetWare", Guess_NetWare, "netware/nw-none", true, nullptr},
       {"FreeBSD", Guess_FreeBSD, "freebsd/fbsd-arm32", false, VersionZero},
       {"Orka", Guess_Orka, "orka/orka35", true, nullptr},
