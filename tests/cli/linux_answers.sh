@@ -52,10 +52,9 @@ check "missing --user: exit 64" status 64 "$tool" unattended linux --full-name x
 hash=$(printf '%s\n' "$password" | "$tool" crypt --stdin)
 salt=$(printf '%s' "$hash" | cut -d'$' -f3)
 check "crypt: openssl agrees" test "$(openssl passwd -5 -salt "$salt" "$password")" = "$hash"
-for salt in 'rounds=1$x' 'rounds=999$abcdefghijklmnopq'; do  # clamped to 1000, as openssl does
-  check "crypt: openssl agrees on $salt" test "$(openssl passwd -5 -salt "$salt" "$password")" = \
-    "$("$tool" crypt --salt "$salt" -- "$password")"
-done
+salt='rounds=999$abcdefghijklmnopq'  # clamped to 1000 rounds and 16 salt characters, as openssl does
+check "crypt: openssl agrees on $salt" test "$(openssl passwd -5 -salt "$salt" "$password")" = \
+  "$("$tool" crypt --salt "$salt" -- "$password")"
 "$tool" crypt --check "$hash" wrong >/dev/null
 check "crypt: a wrong password does not match (exit 1)" test $? -eq 1
 exit $((fails > 0))
