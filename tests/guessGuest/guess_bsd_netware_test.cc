@@ -14,7 +14,6 @@ TEST(GuessFreeBSDNetWare, MasteredMedia) {
       // No 32-bit identifier for 14: the generic one stays.
       {"freebsd/fbsd14-32", "freeBSD"},
       {"freebsd/fbsd14-arm", "arm-freeBSD14-64"},
-      {"freebsd/fbsd12-arm", "arm-freeBSD13-64"},
       {"freebsd/fbsd-nonotes", "freeBSD-64"},
       {"freebsd/fbsd14-line2", "freeBSD-64"},
       {"freebsd/fbsd4-old", "freeBSD"},

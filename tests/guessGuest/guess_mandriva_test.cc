@@ -20,7 +20,6 @@ TEST(GuessMandrivaTurboLumen, MasteredMedia) {
       // Mandriva: volume identifier.
       {"vol2010-32", "mandriva", GUESS_VERSION_MANDRIVA_2008_1_OR_HIGHER, kNoIso},
       {"vol2010-64", "mandriva-64", GUESS_VERSION_MANDRIVA_2008_1_OR_HIGHER, kIso},
-      {"vol2010-32iso", "mandriva", GUESS_VERSION_MANDRIVA_2008_1_OR_HIGHER, kIso},
       // Before 2010 the identifier alone gives no class.
       {"vol2009", "mandriva", 0, kNoIso},
       // The class from the identifier, the architecture from product.id.
@@ -42,12 +41,10 @@ TEST(GuessMandrivaTurboLumen, MasteredMedia) {
       // TurboLinux: the first word of README.
       {"turbo8", "turbolinux"},
       {"turbo-caps", nullptr},
-      {"turbo-late", nullptr},
       // Lumen: package directories.
       {"lumen-64", "tarvex-lumen-64"},
       {"lumen-arm", "arm-tarvex-lumen-64"},
       {"lumen-both", nullptr},
-      {"lumen-none", nullptr},
       {"lumen-nomarker", nullptr},
   };
   ExpectGuesses("mandriva", rows);

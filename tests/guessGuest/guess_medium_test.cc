@@ -164,11 +164,6 @@ TEST(GuessMedium, ListingSurvivesLookupsAndRewinds) {
   }
 }
 
-TEST(GuessMediumDeathTest, MediumWithoutKindStops) {
-  GuessMedium none{};
-  EXPECT_DEATH(Guess_OpenDir(&none, "I386"), "NOT_REACHED lib/guessGuest/guess:[0-9]+");
-}
-
 TEST(GuessElfArch, ClassifiesByMachineLowByte) {
   struct Case {
     size_t length;

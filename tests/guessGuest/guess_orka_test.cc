@@ -31,7 +31,6 @@ TEST(GuessOrka, MasteredMedia) {
       {"orkai65", "zelcore65"},
       {"hyperlet", "zelcore"},
       {"orkai60", "zelcore6"},
-      {"skyvault67", "zelcore65"},
       {"orkai-lower", nullptr},
       {"orkai70", "zelcore7"},
       {"orkai70-both", "zelcore7"},

