@@ -27,9 +27,7 @@ types = {"path": str, "result": int, "guestOS": (str, type(None)),
 # What a person or a script reads off particular media.
 expect = {
     "windows-legacy/winxppro.iso": {"guestOS": "winXPPro", "language": "German"},
-    "windows-legacy/win2003std-x64.iso": {"displayText": "winNetStandard-64"},
     "windows/win81-x64.iso": {"displayText": "Windows 8.1 x64"},
-    "windows/win10-esd-x86.iso": {"versionName": "GUESS_VERSION_WINDOWS_10_ESD"},
     "windows/winmain-client.iso": {"result": 1},
     "redhat/centos7.iso": {"guestOS": "centos7-64", "versionName": "GUESS_VERSION_CENTOS_7"},
     "redhat/fedora35-aarch64.iso": {"noIsolinuxConfig": True},
@@ -77,6 +75,5 @@ for bad in "" "--bogus x.iso" "-r"; do
   # shellcheck disable=SC2086
   check "usage error 64: detect $bad" status 64 "$tool" detect $bad
 done
-check "--help" bash -c '"$0" detect --help >/dev/null' "$tool"
 
 exit $((fails > 0))

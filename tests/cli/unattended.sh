@@ -1,16 +1,15 @@
 #!/usr/bin/env bash
 # tvxguest unattended support / validate and windows-name: exit statuses,
-# messages and JSON, on an unrecognisable image of our own and on every
-# sample image that exists.
+# messages and JSON, on an unrecognisable image of our own and on two
+# sample images.
 set -uo pipefail
-media=${TVX_MEDIA_DIR:-}
+media=${TVX_MEDIA_DIR:?}
 . "$(dirname "$0")/lib/check.sh"
 
 # windows-name
 out=$("$tool" windows-name "Windows Server 2008 R2 SERVERSTANDARDACORE" "Windows 7 CUSTOM"); st=$?
-check_exit "windows-name keys, modifiers and unknown editions" 0 $st "$out" \
+check_exit "windows-name keys and modifiers" 0 $st "$out" \
   "Windows Server 2008 R2 Standard Core"
-check_exit "windows-name leaves unknown editions" 0 $st "$out" "Windows 7 CUSTOM"
 out=$("$tool" windows-name --json "Windows Longhorn SERVERWEB"); st=$?
 check_exit "windows-name --json" 0 $st "$(json "$out" 'j["pretty"]')" '"Windows Server 2008 Web Edition"'
 "$tool" windows-name >/dev/null 2>&1; check_exit "windows-name without a name" 64 $?
@@ -46,17 +45,12 @@ done
 "$tool" unattended frobnicate >/dev/null 2>&1; check_exit "unknown unattended subcommand" 64 $?
 "$tool" unattended support --help | grep -q "Exit status"; check_exit "support --help" 0 $?
 
-# Two images of each family: the JSON parses and agrees with the exit status.
-# (Recognition of every image is the detect test's job; one process start per
-# image here would cost minutes of sanitizer start-up for nothing new.)
-if [ -n "$media" ] && [ -d "$media" ]; then
-  while IFS= read -r -d '' img; do
-    out=$("$tool" unattended support --json "$img" 2>/dev/null); st=$?
-    [ $st -eq 2 ] && continue
-    want=$([ $st -eq 0 ] && echo true || echo false)
-    check_exit "support ${img#"$media"/}: $(json "$out" 'j["guestOS"]')" "$st" "$st" \
-      "$(json "$out" 'j["supported"]')" "$want"
-  done < <(for d in "$media"/*/; do find "$d" -name '*.iso' -print0 | sort -z | head -z -n 2; done)
-fi
+# A recognised image that is offered and one that is not: the JSON agrees
+# with the exit status. (Which guest is offered is the library's test.)
+for row in redhat/centos7:0:true debian/deb11-amd64:1:false; do
+  IFS=: read -r img want supported <<<"$row"
+  out=$("$tool" unattended support --json "$media/$img.iso" 2>/dev/null)
+  check_exit "support --json: $img" "$want" $? "$(json "$out" 'j["supported"]')" "$supported"
+done
 
 exit $((fails > 0))

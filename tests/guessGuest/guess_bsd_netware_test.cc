@@ -14,19 +14,13 @@ TEST(GuessFreeBSDNetWare, MasteredMedia) {
       // No 32-bit identifier for 14: the generic one stays.
       {"freebsd/fbsd14-32", "freeBSD"},
       {"freebsd/fbsd14-arm", "arm-freeBSD14-64"},
-      {"freebsd/fbsd12-486", "freeBSD12"},
-      {"freebsd/fbsd12-arm", "arm-freeBSD13-64"},
-      {"freebsd/fbsd10-64", "freeBSD-64"},
       {"freebsd/fbsd-nonotes", "freeBSD-64"},
       {"freebsd/fbsd14-line2", "freeBSD-64"},
-      {"freebsd/fbsd13-crlf", "freeBSD13-64"},
       {"freebsd/fbsd4-old", "freeBSD"},
       // Plain ISO 9660 shows the kernel as "KERNEL.".
       {"freebsd/fbsd13-plain", "freeBSD13-64"},
       // FreeBSD: unusable kernels.
       {"freebsd/fbsd-arm32", nullptr},
-      {"freebsd/fbsd-short", nullptr},
-      {"freebsd/fbsd-empty", nullptr},
       {"freebsd/fbsd-notes-only", nullptr},
       // NetWare: the first listed release directory.
       {"netware/nw65", "netware6"},

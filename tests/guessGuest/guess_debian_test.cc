@@ -11,7 +11,6 @@ TEST(GuessDebian, MasteredMedia) {
   const GuessRow rows[] = {
       // Debian release and architecture.
       {"deb4-i386", "debian4", 0, kIso},
-      {"deb9-amd64", "debian9-64", 0, kIso},
       // Arm before 10 has no Debian identifier of its own.
       {"deb9-arm64", "arm-ubuntu-64", 0, kNoIso},
       {"deb10-arm64", "arm-debian10-64", 0, kNoIso},
@@ -19,7 +18,6 @@ TEST(GuessDebian, MasteredMedia) {
       {"deb11-noisolinux", "debian11", 0, kNoIso},
       {"deb12-amd64", nullptr},
       {"deb10-noarch", nullptr},
-      {"deb-amd64-first", nullptr},
       // Ubuntu desktop classes.
       {"ubu-704", "ubuntu", GUESS_VERSION_UBUNTU_704_OR_LOWER, kIso, "7.04"},
       {"ubu-710", "ubuntu", GUESS_VERSION_UBUNTU_710_OR_HIGHER, kIso, "7.10"},
@@ -42,22 +40,18 @@ TEST(GuessDebian, MasteredMedia) {
       {"srv-810", "ubuntu-64", GUESS_VERSION_UBUNTU_SERVER_810_OR_HIGHER, kIso, "Server 8.10"},
       {"srv-1404", "ubuntu-64", GUESS_VERSION_UBUNTU_SERVER_1404, kIso, "Server 14.04.1"},
       {"srv-140402", "ubuntu-64", GUESS_VERSION_UBUNTU_SERVER_140402, kIso, "Server 14.04.2"},
-      {"srv-140405", "ubuntu", GUESS_VERSION_UBUNTU_SERVER_140402, kIso, "Server 14.04.5"},
       {"srv-1410", "ubuntu-64", GUESS_VERSION_UBUNTU_SERVER_1410, kIso, "Server 14.10"},
       {"srv-1604", "ubuntu-64", GUESS_VERSION_UBUNTU_SERVER_1504_OR_HIGHER, kIso, "Server 16.04.7"},
       // Damaged info files.
       {"bad-empty", nullptr},
-      {"bad-binary", nullptr},
       // The text ends at its first NUL byte: no architecture word is left.
       {"bad-nul-early", nullptr},
       // The CR LF only touches the last word.
       {"bad-crlf", "ubuntu-64", GUESS_VERSION_UBUNTU_1504_TO_2004, kIso, "20.04.1"},
-      {"bad-spaces", nullptr, 0, false, ""},
       // Cut to 31 characters.
       {"bad-longword", "ubuntu-64", GUESS_VERSION_UBUNTU_1404, kNoIso,
        "14.04.0000000000000000000000000"},
       {"bad-huge", "ubuntu-64", GUESS_VERSION_UBUNTU_1504_TO_2004, kNoIso, "20.04"},
-      {"ubu-2004-udf", "ubuntu-64", GUESS_VERSION_UBUNTU_1504_TO_2004, kIso, "20.04.1"},
   };
   ExpectGuesses("debian", rows);
 }

@@ -64,8 +64,6 @@ TEST(GuessSUSE, MasteredMedia) {
       {"bad-empty", "opensuse", GUESS_VERSION_OPENSUSE_11_2_OR_LOWER, kNoIso},
       // A bare PRODUCT key keeps an empty product name, which no row knows.
       {"bad-keys-only", nullptr},
-      // The text ends at its leading NUL byte.
-      {"bad-binary", "opensuse", GUESS_VERSION_OPENSUSE_11_2_OR_LOWER, kNoIso},
       // The carriage returns stay in the values: "x86_64\r" is not x86_64.
       {"bad-crlf", "sles10", GUESS_VERSION_SLES_10_SP2_OR_LOWER, kNoIso},
       {"bad-version", "opensuse", GUESS_VERSION_OPENSUSE_11_2_OR_LOWER, kNoIso},

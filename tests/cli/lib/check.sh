@@ -29,11 +29,6 @@ status() {  # status EXPECTED COMMAND...: the command's exit status, its output 
 json() {  # json JSON EXPRESSION: j[...] of the parsed JSON, as JSON text
   /usr/bin/python3 -c 'import json,sys; j=json.loads(sys.argv[1]); print(json.dumps(eval(sys.argv[2])))' "$1" "$2"
 }
-need_command() {  # need_command WORDS...: skip the test when this tool lacks the command
-  "$tool" "$@" --help >/dev/null 2>&1 && return
-  echo "skip: this tool has no '$*' command"
-  exit 0
-}
 need_pki() {  # makes the test PKI in $certs, the build's own certificate directory, or skips
   certs=${TVX_CERT_DIR:-}
   if [ -z "$certs" ]; then
@@ -41,7 +36,4 @@ need_pki() {  # makes the test PKI in $certs, the build's own certificate direct
     exit $((fails > 0))
   fi
   "${TVX_SOURCE_DIR:?}/scripts/make-test-pki" "$certs" || { echo "FAIL: make-test-pki"; exit 1; }
-}
-usable() {  # usable IMAGE: mastered, and recognised by this build
-  [ -e "$1" ] && "$tool" detect "$1" >/dev/null 2>&1
 }
