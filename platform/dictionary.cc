@@ -121,23 +121,6 @@ char *Dictionary_WriteToBuffer(const Dictionary *dict, size_t *out_size) {
   return UtilSafeStrndup0(text.data(), text.size());
 }
 
-Bool Dictionary_WriteFile(const Dictionary *dict, const char *path, MsgList **messages) {
-  std::string text = tvx::WriteDictionaryText(dict->entries);
-  FileIODescriptor fd;
-  FileIOResult rc = FileIO_Open(&fd, path, FILEIO_OPEN_ACCESS_WRITE, FILEIO_OPEN_CREATE_EMPTY);
-  if (rc == FILEIO_SUCCESS) {
-    rc = FileIO_Write(&fd, text.data(), text.size(), nullptr);
-    FileIOResult closed = FileIO_Close(&fd);
-    if (rc == FILEIO_SUCCESS) rc = closed;
-  }
-  if (rc != FILEIO_SUCCESS) {
-    MsgList_Append(messages, "@&!*@*@(msg.dictionary.write)cannot write \"%s\": %s", path,
-                   FileIO_ErrorEnglish(rc));
-    return FALSE;
-  }
-  return TRUE;
-}
-
 size_t Dictionary_Iterate(const Dictionary *dict, DictionaryIterFn fn, void *ctx) {
   size_t visited = 0;
   // A copy, so a callback that changes the dictionary cannot break the walk.
@@ -150,10 +133,6 @@ size_t Dictionary_Iterate(const Dictionary *dict, DictionaryIterFn fn, void *ctx
 }
 
 size_t Dictionary_NumberOfEntries(const Dictionary *dict) { return dict->entries.size(); }
-
-Bool Dictionary_IsDefined(const Dictionary *dict, const char *name) {
-  return FindLast(dict, name) != nullptr;
-}
 
 Bool Dictionary_Get(const Dictionary *dict, const char *name, DictionaryType type, void *out) {
   const DictionaryEntry *e = FindLast(dict, name);
@@ -183,13 +162,6 @@ Bool Dictionary_Get(const Dictionary *dict, const char *name, DictionaryType typ
     }
   }
   return FALSE;
-}
-
-Bool Dictionary_Unset(Dictionary *dict, const char *name) {
-  size_t before = dict->entries.size();
-  std::erase_if(dict->entries,
-                [name](const DictionaryEntry &e) { return tvx::ascii::Equal(e.name, name); });
-  return dict->entries.size() != before;
 }
 
 Bool Dictionary_StringToBool(const char *text, Bool dflt) {
@@ -225,15 +197,6 @@ Bool Dict_GetBool(const Dictionary *dict, Bool dflt, const char *nameFmt, ...) {
   return Dictionary_Get(dict, name.c_str(), DICT_BOOL, &v) ? v : dflt;
 }
 
-int32_t Dict_GetLong(const Dictionary *dict, int32_t dflt, const char *nameFmt, ...) {
-  va_list args;
-  va_start(args, nameFmt);
-  std::string name = FormatName(nameFmt, args);
-  va_end(args);
-  int32_t v = dflt;
-  return Dictionary_Get(dict, name.c_str(), DICT_INT32, &v) ? v : dflt;
-}
-
 Bool Dict_SetString(Dictionary *dict, const char *value, const char *nameFmt, ...) {
   va_list args;
   va_start(args, nameFmt);
@@ -248,12 +211,4 @@ Bool Dict_SetBool(Dictionary *dict, Bool value, const char *nameFmt, ...) {
   std::string name = FormatName(nameFmt, args);
   va_end(args);
   return Set(dict, name, value ? "TRUE" : "FALSE");
-}
-
-Bool Dict_SetLong(Dictionary *dict, int32_t value, const char *nameFmt, ...) {
-  va_list args;
-  va_start(args, nameFmt);
-  std::string name = FormatName(nameFmt, args);
-  va_end(args);
-  return Set(dict, name, std::to_string(value));
 }

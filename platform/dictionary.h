@@ -49,19 +49,14 @@ Bool Dictionary_LoadFromBuffer(Dictionary *dict, const char *buf, size_t size);
 // one `name = "value"` line per entry (allocated, never null); `out_size`
 // (optional) receives its length. Loading it gives back the same entries.
 char *Dictionary_WriteToBuffer(const Dictionary *dict, size_t *out_size);
-// Dictionary_WriteFile writes that text to `path`, replacing the file.
-Bool Dictionary_WriteFile(const Dictionary *dict, const char *path, MsgList **messages);
 
 // Dictionary_Iterate walks the entries in order and returns how many were
 // visited (all of them unless the callback stopped the walk).
 size_t Dictionary_Iterate(const Dictionary *dict, DictionaryIterFn fn, void *ctx);
 size_t Dictionary_NumberOfEntries(const Dictionary *dict);
-Bool Dictionary_IsDefined(const Dictionary *dict, const char *name);
 // Dictionary_Get reads the entry as `type` into `out`; FALSE when it is
 // absent or its value is not of that type (then `out` is untouched).
 Bool Dictionary_Get(const Dictionary *dict, const char *name, DictionaryType type, void *out);
-// Dictionary_Unset removes every entry of that name; FALSE when none.
-Bool Dictionary_Unset(Dictionary *dict, const char *name);
 
 // Dictionary_StringToBool reads "true", "yes", "on", "1" as TRUE and
 // "false", "no", "off", "0" as FALSE (any case, surrounding blanks ignored);
@@ -75,8 +70,6 @@ Bool Dictionary_StringToBool(const char *text, Bool dflt);
 char *Dict_GetString(const Dictionary *dict, const char *dflt, const char *nameFmt, ...)
     TVX_PRINTF(3, 4);
 Bool Dict_GetBool(const Dictionary *dict, Bool dflt, const char *nameFmt, ...) TVX_PRINTF(3, 4);
-int32_t Dict_GetLong(const Dictionary *dict, int32_t dflt, const char *nameFmt, ...)
-    TVX_PRINTF(3, 4);
 // Setters replace the value of the last entry of that name (dropping earlier
 // repeats) or append a new entry. Bools are stored as "TRUE" / "FALSE".
 // FALSE when the name cannot be written in the text format (empty, or holding
@@ -84,7 +77,6 @@ int32_t Dict_GetLong(const Dictionary *dict, int32_t dflt, const char *nameFmt, 
 Bool Dict_SetString(Dictionary *dict, const char *value, const char *nameFmt, ...)
     TVX_PRINTF(3, 4);
 Bool Dict_SetBool(Dictionary *dict, Bool value, const char *nameFmt, ...) TVX_PRINTF(3, 4);
-Bool Dict_SetLong(Dictionary *dict, int32_t value, const char *nameFmt, ...) TVX_PRINTF(3, 4);
 
 #include "platform/unique.h"
 namespace tvx {

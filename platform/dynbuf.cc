@@ -49,13 +49,6 @@ Bool DynBuf_Strcat(DynBuf *b, const char *text) { return DynBuf_Append(b, text, 
 
 Bool DynBuf_AppendByte(DynBuf *b, char c) { return DynBuf_Append(b, &c, 1); }
 
-Bool DynBuf_SetSize(DynBuf *b, size_t size) {
-  DynBuf_Enlarge(b, size);
-  if (size > b->size) std::memset(b->data + b->size, 0, size - b->size);
-  b->size = size;
-  return TRUE;
-}
-
 void *DynBuf_Detach(DynBuf *b) {
   void *p = b->data;
   if (p == nullptr) {

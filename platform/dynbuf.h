@@ -19,7 +19,6 @@ Bool DynBuf_Enlarge(DynBuf *b, size_t min_size);
 Bool DynBuf_Append(DynBuf *b, const void *data, size_t size);
 Bool DynBuf_Strcat(DynBuf *b, const char *text);  // appends text without NUL
 Bool DynBuf_AppendByte(DynBuf *b, char c);
-Bool DynBuf_SetSize(DynBuf *b, size_t size);
 // DynBuf_Detach hands the bytes (malloc'd, free with free) to the caller and
 // leaves the buffer empty. Never null: an empty buffer yields a 1-byte block.
 void *DynBuf_Detach(DynBuf *b);

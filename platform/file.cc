@@ -221,9 +221,3 @@ char *File_GetSafeTmpDir(Bool create) {
   }
   return Dup(dir);
 }
-
-char *File_FullPath(const char *path) {
-  char *resolved = realpath(path, nullptr);
-  if (resolved == nullptr) return nullptr;
-  return resolved;
-}

@@ -44,5 +44,3 @@ int File_UnlinkIfExists(const char *path);
 // `create` is TRUE. Null when it is missing, not a directory of this user, or
 // open to others.
 char *File_GetSafeTmpDir(Bool create);
-// File_FullPath resolves `path` (realpath); null when it does not exist.
-char *File_FullPath(const char *path);

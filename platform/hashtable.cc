@@ -20,10 +20,6 @@ struct HashTable {
   std::unordered_map<std::string, std::list<Entry>::iterator> index;
 
   std::string Normal(const void *key) const {
-    if (keyType == HASH_INT_KEY) {
-      auto v = reinterpret_cast<uintptr_t>(key);
-      return std::string(reinterpret_cast<const char *>(&v), sizeof v);
-    }
     std::string s(static_cast<const char *>(key));
     if (keyType == HASH_ISTRING_KEY) {
       for (char &c : s) {
@@ -40,12 +36,12 @@ struct HashTable {
 
 HashTable *HashTable_Alloc(uint32_t numBuckets, int keyType, HashTableFreeEntryFn freeFn) {
   int type = keyType & ~HASH_FLAG_COPYKEY;
-  if (type != HASH_STRING_KEY && type != HASH_ISTRING_KEY && type != HASH_INT_KEY) {
+  if (type != HASH_STRING_KEY && type != HASH_ISTRING_KEY) {
     Panic("HashTable_Alloc: unknown key type %d\n", keyType);
   }
   auto *ht = new HashTable;
   ht->keyType = type;
-  ht->copyKeys = (keyType & HASH_FLAG_COPYKEY) != 0 && type != HASH_INT_KEY;
+  ht->copyKeys = (keyType & HASH_FLAG_COPYKEY) != 0;
   ht->freeFn = freeFn;
   ht->index.reserve(numBuckets);
   return ht;
@@ -74,25 +70,6 @@ Bool HashTable_Lookup(const HashTable *ht, const void *key, void **out_data) {
   auto found = ht->index.find(ht->Normal(key));
   if (found == ht->index.end()) return FALSE;
   if (out_data != nullptr) *out_data = found->second->data;
-  return TRUE;
-}
-
-void *HashTable_LookupOrInsert(HashTable *ht, const void *key, void *clientData) {
-  void *existing = nullptr;
-  if (HashTable_Lookup(ht, key, &existing)) return existing;
-  HashTable_Insert(ht, key, clientData);
-  return clientData;
-}
-
-Bool HashTable_ReplaceOrInsert(HashTable *ht, const void *key, void *clientData) {
-  auto found = ht->index.find(ht->Normal(key));
-  if (found == ht->index.end()) {
-    HashTable_Insert(ht, key, clientData);
-    return FALSE;
-  }
-  void *old = found->second->data;
-  found->second->data = clientData;
-  if (old != clientData) ht->Release(old);
   return TRUE;
 }
 

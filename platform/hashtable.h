@@ -15,7 +15,6 @@ struct HashTable;
 enum : int {
   HASH_STRING_KEY = 0x00,   // NUL-terminated text, compared exactly
   HASH_ISTRING_KEY = 0x01,  // NUL-terminated text, ASCII case ignored
-  HASH_INT_KEY = 0x02,      // the key pointer's value itself (uintptr_t)
   HASH_FLAG_COPYKEY = 0x10,
 };
 
@@ -36,13 +35,6 @@ Bool HashTable_Insert(HashTable *ht, const void *key, void *clientData);
 // HashTable_Lookup: TRUE when the key is present; its data goes to
 // `out_data` (optional).
 Bool HashTable_Lookup(const HashTable *ht, const void *key, void **out_data);
-// HashTable_LookupOrInsert returns the data of the present entry, or inserts
-// `clientData` and returns it.
-void *HashTable_LookupOrInsert(HashTable *ht, const void *key, void *clientData);
-// HashTable_ReplaceOrInsert sets the key's data, releasing the old data
-// through the free function; TRUE when an entry was replaced. The entry
-// keeps its place in the walk order.
-Bool HashTable_ReplaceOrInsert(HashTable *ht, const void *key, void *clientData);
 // HashTable_Delete removes the key's entry, releasing its data; FALSE when
 // absent. HashTable_Remove removes it without releasing; the data goes to
 // `out_data` (optional).

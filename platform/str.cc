@@ -22,17 +22,6 @@ int Str_Snprintf(char *buf, size_t size, const char *fmt, ...) {
   return n;
 }
 
-int Str_Sprintf(char *buf, size_t size, const char *fmt, ...) {
-  va_list args;
-  va_start(args, fmt);
-  int n = std::vsnprintf(buf, size, fmt, args);
-  va_end(args);
-  if (n < 0 || static_cast<size_t>(n) >= size) {
-    Panic("Str_Sprintf: output of \"%s\" does not fit %zu bytes\n", fmt, size);
-  }
-  return n;
-}
-
 char *Str_Vasprintf(size_t *out_length, const char *fmt, va_list args) {
   va_list copy;
   va_copy(copy, args);
@@ -61,28 +50,6 @@ char *Str_SafeAsprintf(size_t *out_length, const char *fmt, ...) {
   va_end(args);
   if (out == nullptr) Panic("Str_SafeAsprintf: cannot format \"%s\"\n", fmt);
   return out;
-}
-
-char *Str_Strcpy(char *dst, const char *src, size_t size) {
-  if (size == 0) return dst;
-  size_t n = strnlen(src, size - 1);
-  std::memmove(dst, src, n);
-  dst[n] = '\0';
-  return dst;
-}
-
-char *Str_Strcat(char *dst, const char *src, size_t size) {
-  if (size == 0) return dst;
-  size_t used = strnlen(dst, size);
-  if (used >= size) {
-    // Not terminated within its size: terminate rather than run past it.
-    dst[size - 1] = '\0';
-    return dst;
-  }
-  size_t n = strnlen(src, size - 1 - used);
-  std::memmove(dst + used, src, n);
-  dst[used + n] = '\0';
-  return dst;
 }
 
 char *Str_ToUpper(char *s) {
@@ -178,10 +145,6 @@ Bool StrUtil_EndsWith(const char *s, const char *suffix) {
 
 Bool StrUtil_CaselessStartsWith(const char *s, const char *prefix) {
   return tvx::ascii::StartsWith(s, prefix);
-}
-
-Bool StrUtil_CaselessEndsWith(const char *s, const char *suffix) {
-  return tvx::ascii::EndsWith(s, suffix);
 }
 
 Bool StrUtil_DecimalStrToUint(unsigned int *out, const char **str) {

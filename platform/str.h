@@ -11,21 +11,12 @@
 // length written, or -1 when the output was cut (the buffer then holds the cut,
 // terminated text).
 int Str_Snprintf(char *buf, size_t size, const char *fmt, ...) TVX_PRINTF(3, 4);
-// Str_Sprintf is Str_Snprintf that treats a cut as a programming error:
-// it panics instead of returning -1.
-int Str_Sprintf(char *buf, size_t size, const char *fmt, ...) TVX_PRINTF(3, 4);
 // Str_Asprintf returns a new text, or null on failure; `out_length` (optional)
 // receives its length.
 char *Str_Asprintf(size_t *out_length, const char *fmt, ...) TVX_PRINTF(2, 3);
 char *Str_Vasprintf(size_t *out_length, const char *fmt, va_list args) TVX_PRINTF(2, 0);
 // Str_SafeAsprintf is Str_Asprintf that never returns null.
 char *Str_SafeAsprintf(size_t *out_length, const char *fmt, ...) TVX_PRINTF(2, 3);
-// Str_Strcpy copies `src` into `dst` of `size` bytes, cutting and terminating.
-// Returns dst.
-char *Str_Strcpy(char *dst, const char *src, size_t size);
-// Str_Strcat appends `src` to the text in `dst` of `size` bytes, cutting and
-// terminating. Returns dst.
-char *Str_Strcat(char *dst, const char *src, size_t size);
 // Str_ToUpper / Str_ToLower convert ASCII letters in place and return `s`.
 char *Str_ToUpper(char *s);
 char *Str_ToLower(char *s);
@@ -44,7 +35,6 @@ Bool StrUtil_GetNextIntToken(int32_t *out, unsigned int *index, const char *str,
 Bool StrUtil_StartsWith(const char *s, const char *prefix);
 Bool StrUtil_EndsWith(const char *s, const char *suffix);
 Bool StrUtil_CaselessStartsWith(const char *s, const char *prefix);
-Bool StrUtil_CaselessEndsWith(const char *s, const char *suffix);
 // StrUtil_DecimalStrToUint reads decimal digits at *str into *out and advances
 // *str past them. FALSE (and *str unchanged) when no digit is there or the
 // number does not fit 32 bits.
