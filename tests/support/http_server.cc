@@ -151,7 +151,6 @@ void HttpServer::Serve(int fd) {
     promised = body.size();
     body.resize(body.size() / 2);
   }
-  if (mode_ == Mode::kLieSize && head && status[0] == '2') promised = body.size() * 2;
   size_t length = promised != 0 ? promised : body.size();
   std::string out = "HTTP/1.1 " + status + "\r\nContent-Length: " + std::to_string(length) +
                     "\r\nConnection: close\r\n" + extra + "\r\n";

@@ -26,7 +26,6 @@ class HttpServer {
     kWrongRange,    // 206 for a range that starts one byte later
     kShortBody,     // promises the asked bytes, sends half, closes
     kLongRange,     // 206 with the range and a block more than asked
-    kLieSize,       // HEAD promises twice the file's size
     kError500,      // every request answered 500
     kNoAnswer,      // accepts, then says nothing until the client gives up
     kRedirectLoop,  // every request redirected to itself
