@@ -71,9 +71,10 @@ check "batch: a line per image" test "$(cat "$tmp/human")" = \
   "$media/windows-legacy/win95.iso: win95
 $media/windows/winmain-client.iso: not recognised"
 
-for bad in "" "--bogus x.iso" "-r"; do
+for bad in "" "--bogus x.iso" "-r" "--json=yes x.iso"; do
   # shellcheck disable=SC2086
   check "usage error 64: detect $bad" status 64 "$tool" detect $bad
 done
+check "-- ends the options" status 2 "$tool" detect -- "$tmp/--json"
 
 exit $((fails > 0))
