@@ -72,7 +72,6 @@ TEST(GuestOS, PredicatesFollowTheFamilies) {
       {"windows11-64", kWin | k2kUp | kVistaUp | k11C | k64},
       {"rhel4", kLin | kOldLibc},
       {"rhel5-64", kLin | k64},
-      {"arm-ubuntu-64", kLin | k64},
       {"solaris11-64", kSol | k64},
       {"netware6", kNw},
       {"darwin11-64", kMac | k64},

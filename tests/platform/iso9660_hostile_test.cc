@@ -67,22 +67,16 @@ TEST(Iso9660Hostile, VolumeDescriptors) {
   } cases[] = {
       {"well formed", nullptr, nullptr, ISO9660_OK},
       {"empty", nullptr, [](auto &b) { b.clear(); }, ISO9660_ERR_FORMAT},
-      {"cut before the descriptors", nullptr, [](auto &b) { b.resize(16 * 2048 + 100); },
-       ISO9660_ERR_FORMAT},
       {"no standard identifier", [](IsoBuilder &b) { b.Put(16 * 2048 + 1, "BEA01"); }, nullptr,
        ISO9660_ERR_FORMAT},
       {"supplementary descriptor only", [](IsoBuilder &b) { b.Put(16 * 2048, "\2"); }, nullptr,
        ISO9660_ERR_FORMAT},
       {"block size 512", [](IsoBuilder &b) { b.Put(16 * 2048 + 128, Both16(512)); }, nullptr,
        ISO9660_ERR_CORRUPT},
-      {"block size copies differ", [](IsoBuilder &b) { b.Put(16 * 2048 + 130, "\1"); }, nullptr,
-       ISO9660_ERR_CORRUPT},
       {"volume size copies differ", nullptr, [](auto &b) { b[16 * 2048 + 84] ^= 1; },
        ISO9660_ERR_CORRUPT},
       {"root record too short", [](IsoBuilder &b) { b.Put(16 * 2048 + 156, "\x10"); }, nullptr,
        ISO9660_ERR_CORRUPT},
-      {"root not a directory", [](IsoBuilder &b) { b.Put(16 * 2048 + 156 + 25, std::string(1, '\0')); },
-       nullptr, ISO9660_ERR_CORRUPT},
       {"root beyond the end", [](IsoBuilder &b) { b.SetRoot(5000, 2048); }, nullptr,
        ISO9660_ERR_CORRUPT},
       {"root of length 0", [](IsoBuilder &b) { b.SetRoot(kRoot, 0); }, nullptr, ISO9660_ERR_CORRUPT},
@@ -131,7 +125,6 @@ TEST(Iso9660Hostile, DirectoryRecords) {
       {"zero fill to the end of a block", std::string(2048 - 68, '\0') + file, 4096, ISO9660_OK},
       {"record crossing its block", crossing + file, 4096, ISO9660_ERR_CORRUPT},
       {"name longer than the record", With(file, 32, 60), 4096, ISO9660_ERR_CORRUPT},
-      {"extent copies differ", With(file, 9, 7), 4096, ISO9660_ERR_CORRUPT},
       {"multi-extent file without its last record",
        tvxtest::RecordBytes({"F;1", 40, 2048, 0x80, ""}), 4096, ISO9660_ERR_CORRUPT},
       {"multi-extent pieces with different names",
@@ -222,8 +215,7 @@ TEST(Iso9660Hostile, UnsafeNamesAreListedButNeverExtracted) {
     IsoBuilder b;
     uint32_t data = b.NewBlocks(1);
     b.PutBlock(data, "payload");
-    std::vector<IsoRecord> root = {{"OK;1", data, 7, 0, c.systemUse}, {c.isoId, data, 7, 0, c.systemUse}};
-    root[0].systemUse = "";
+    std::vector<IsoRecord> root = {{"OK;1", data, 7, 0, ""}, {c.isoId, data, 7, 0, c.systemUse}};
     if (c.mode == 2) {
       uint32_t jroot = b.NewBlocks(1);
       b.AddJoliet(jroot, b.Dir(jroot, jroot, {{std::string("\0O\0K", 4), data, 7, 0, ""},
@@ -292,8 +284,6 @@ TEST(Iso9660Hostile, SuspContinuationAreas) {
       {"CE beyond the image", [](uint32_t) { return susp::CE(90000, 0, 100); },
        [](uint32_t) { return std::string(); }, "F"},
       {"CE crossing its block", [](uint32_t ce) { return susp::CE(ce, 2000, 100); },
-       [](uint32_t) { return std::string(); }, "F"},
-      {"entry length 0 ends the area", [](uint32_t) { return std::string("NM\0\1", 4); },
        [](uint32_t) { return std::string(); }, "F"},
       {"entry longer than the area", [](uint32_t) { return std::string("NM\x60\1\0abc", 8); },
        [](uint32_t) { return std::string(); }, "F"},

@@ -5,6 +5,7 @@
 
 #include <map>
 #include <regex>
+#include <sstream>
 #include <string>
 #include <vector>
 
@@ -31,16 +32,10 @@ std::ostream &operator<<(std::ostream &os, const Item &i) {
 // of an extension-less name; compare plain names in one spelling.
 std::string Fold(std::string path, bool plain) {
   if (!plain) return path;
-  for (char &c : path) c = static_cast<char>(std::tolower(static_cast<unsigned char>(c)));
   std::string out;
-  size_t start = 0;
-  while (start <= path.size()) {
-    size_t slash = path.find('/', start);
-    std::string comp = path.substr(start, slash == std::string::npos ? std::string::npos : slash - start);
-    if (!comp.empty() && comp.back() == '.') comp.pop_back();
-    out += (out.empty() && start == 0 ? "" : "/") + comp;
-    if (slash == std::string::npos) break;
-    start = slash + 1;
+  for (size_t i = 0; i < path.size(); ++i) {
+    if (path[i] == '.' && (i + 1 == path.size() || path[i + 1] == '/')) continue;
+    out += static_cast<char>(std::tolower(static_cast<unsigned char>(path[i])));
   }
   return out;
 }
@@ -79,11 +74,8 @@ Tree IsoInfo(const std::string &image, const std::string &flags) {
       R"(^\s+([d-])\s+\[LSN\s+\d+\]\s+(\d+)\s+\w{3} \d{2} \d{4} \d{2}:\d{2}:\d{2}  (.*)$)");
   Tree t;
   std::string dir;
-  size_t pos = 0;
-  while (pos < out.size()) {
-    size_t nl = out.find('\n', pos);
-    std::string l = out.substr(pos, nl == std::string::npos ? std::string::npos : nl - pos);
-    pos = nl == std::string::npos ? out.size() : nl + 1;
+  std::istringstream lines(out);
+  for (std::string l; std::getline(lines, l);) {
     std::smatch m;
     if (std::regex_match(l, m, header)) {
       dir = m[1].str();

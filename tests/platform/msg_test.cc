@@ -36,7 +36,6 @@ TEST(Msg, DefaultTextsWithoutCatalogue) {
       {"plain text", "plain text", "plain text"},
       {"@&!*@*@(msg.unclosed Server", "<null>", "@&!*@*@(msg.unclosed Server"},
       {"@&!*@*@no parenthesis", "<null>", "@&!*@*@no parenthesis"},
-      {"@&!*@*@()empty id", "<null>", "@&!*@*@()empty id"},
   };
   for (const auto &c : cases) {
     EXPECT_EQ(Take(Msg_GetString(c.id)), c.get) << c.id;

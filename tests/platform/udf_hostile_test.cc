@@ -20,21 +20,17 @@ namespace {
 
 using tvxtest::OpenUdfBytes;
 
-void Expected(const UdfNodeSpec &n, const std::string &path, tvxtest::UdfTree *t) {
+// The tree a reader must find below `n`, from the builder's own spec.
+tvxtest::UdfTree Expected(const UdfNodeSpec &n, const std::string &path = "", tvxtest::UdfTree t = {}) {
   for (const UdfNodeSpec &c : n.children) {
     std::string p = path.empty() ? c.name : path + "/" + c.name;
     if (c.dir) {
-      t->dirs[p] = true;
-      Expected(c, p, t);
+      t.dirs[p] = true;
+      t = Expected(c, p, std::move(t));
     } else {
-      t->files[p] = c.data;
+      t.files[p] = c.data;
     }
   }
-}
-
-tvxtest::UdfTree Expected(const UdfNodeSpec &root) {
-  tvxtest::UdfTree t;
-  Expected(root, "", &t);
   return t;
 }
 
