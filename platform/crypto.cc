@@ -3,7 +3,6 @@
 #include <openssl/evp.h>
 
 #include "platform/ascii.h"
-#include "platform/log.h"
 #include "platform/openssl_unique.h"
 
 struct CryptoHash {
@@ -46,8 +45,6 @@ CryptoError Digest(EVP_MD_CTX *ctx, const CryptoHash *hash, const void *data, si
   }
   return CRYPTO_ERROR_SUCCESS;
 }
-
-EVP_MD_CTX *State(CryptoHashSHA256Context *ctx) { return static_cast<EVP_MD_CTX *>(ctx->state); }
 
 }  // namespace
 
@@ -96,33 +93,6 @@ CryptoError CryptoHashSession::Compute(const void *data, size_t len, uint8_t *ou
                                        size_t outSize) {
   if (ctx_ == nullptr) return CRYPTO_ERROR_NOMEM;
   return Digest(static_cast<EVP_MD_CTX *>(ctx_), hash_, data, len, out, outSize);
-}
-
-void CryptoHash_InitSHA256(CryptoHashSHA256Context *ctx) {
-  EVP_MD_CTX *md = EVP_MD_CTX_new();
-  if (md == nullptr || EVP_DigestInit_ex(md, EVP_sha256(), nullptr) != 1) {
-    Panic("CryptoHash_InitSHA256: cannot start a SHA-256 context\n");
-  }
-  ctx->state = md;
-}
-
-void CryptoHash_UpdateSHA256(CryptoHashSHA256Context *ctx, const void *data, size_t len) {
-  if (EVP_DigestUpdate(State(ctx), data, len) != 1) {
-    Panic("CryptoHash_UpdateSHA256: digest update failed\n");
-  }
-}
-
-void CryptoHash_FinalSHA256(CryptoHashSHA256Context *ctx, uint8_t digest[32]) {
-  unsigned int written = 0;
-  if (EVP_DigestFinal_ex(State(ctx), digest, &written) != 1 || written != 32) {
-    Panic("CryptoHash_FinalSHA256: digest final failed\n");
-  }
-  CryptoHash_AbortSHA256(ctx);
-}
-
-void CryptoHash_AbortSHA256(CryptoHashSHA256Context *ctx) {
-  EVP_MD_CTX_free(State(ctx));
-  ctx->state = nullptr;
 }
 
 Bool Base64_Encode(const uint8_t *in, size_t len, char *out, size_t outSize, size_t *out_len) {

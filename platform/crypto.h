@@ -47,17 +47,6 @@ class CryptoHashSession {
   void *ctx_;  // EVP_MD_CTX, owned
 };
 
-// Streaming SHA-256. Init starts a context, Update feeds it, Final writes the
-// 32-byte digest and ends it (Init again before reuse). A context that is
-// never finished must be ended with CryptoHash_AbortSHA256.
-struct CryptoHashSHA256Context {
-  void *state;  // owned by the functions below
-};
-void CryptoHash_InitSHA256(CryptoHashSHA256Context *ctx);
-void CryptoHash_UpdateSHA256(CryptoHashSHA256Context *ctx, const void *data, size_t len);
-void CryptoHash_FinalSHA256(CryptoHashSHA256Context *ctx, uint8_t digest[32]);
-void CryptoHash_AbortSHA256(CryptoHashSHA256Context *ctx);
-
 // Base64_Encode writes the standard base64 form (with "=" padding) of `len`
 // bytes and a terminating NUL into `out` of `outSize` bytes; FALSE when it
 // does not fit ((len + 2) / 3 * 4 + 1 bytes are needed). `out_len`

@@ -82,13 +82,6 @@ Bool HashTable_Remove(HashTable *ht, const void *key, void **out_data) {
   return TRUE;
 }
 
-Bool HashTable_Delete(HashTable *ht, const void *key) {
-  void *data = nullptr;
-  if (!HashTable_Remove(ht, key, &data)) return FALSE;
-  ht->Release(data);
-  return TRUE;
-}
-
 void HashTable_Clear(HashTable *ht) {
   // Unhook everything first, so a free function that looks at the table
   // finds it consistent (empty).
@@ -97,8 +90,6 @@ void HashTable_Clear(HashTable *ht) {
   ht->index.clear();
   for (auto &e : entries) ht->Release(e.data);
 }
-
-size_t HashTable_GetNumElements(const HashTable *ht) { return ht->order.size(); }
 
 int HashTable_ForEach(const HashTable *ht, HashTableForEachFn fn, void *ctx) {
   for (const auto &e : ht->order) {

@@ -35,14 +35,11 @@ Bool HashTable_Insert(HashTable *ht, const void *key, void *clientData);
 // HashTable_Lookup: TRUE when the key is present; its data goes to
 // `out_data` (optional).
 Bool HashTable_Lookup(const HashTable *ht, const void *key, void **out_data);
-// HashTable_Delete removes the key's entry, releasing its data; FALSE when
-// absent. HashTable_Remove removes it without releasing; the data goes to
-// `out_data` (optional).
-Bool HashTable_Delete(HashTable *ht, const void *key);
+// HashTable_Remove removes the key's entry without releasing its data; the
+// data goes to `out_data` (optional). FALSE when absent.
 Bool HashTable_Remove(HashTable *ht, const void *key, void **out_data);
 // HashTable_Clear deletes every entry.
 void HashTable_Clear(HashTable *ht);
-size_t HashTable_GetNumElements(const HashTable *ht);
 // HashTable_ForEach walks the entries in insertion order and returns the
 // callback's first non-zero result, or 0. The callback must not change the
 // table.
