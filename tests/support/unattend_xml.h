@@ -6,9 +6,10 @@
 #include <libxml/xpath.h>
 #include <libxml/xpathInternals.h>
 
-#include <cstdlib>
 #include <string>
 #include <vector>
+
+#include "support/run_argv.h"
 
 namespace tvxtest {
 
@@ -61,8 +62,7 @@ class UnattendXml {
 
 // XmllintAccepts runs the independent checker on a file.
 inline bool XmllintAccepts(const std::string &path) {
-  std::string cmd = "xmllint --noout '" + path + "' 2>/dev/null";
-  return std::system(cmd.c_str()) == 0;
+  return RunArgv({"xmllint", "--noout", path}) == 0;
 }
 
 // Paths of the unattend elements that tests look at.
