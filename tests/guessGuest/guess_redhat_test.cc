@@ -75,12 +75,9 @@ TEST(GuessRedHat, MasteredMedia) {
       {"fedora-live-aa64", "arm-Fedora-64", GUESS_VERSION_FEDORA_LIVE, true},
       {"fedora-live", "Fedora", GUESS_VERSION_FEDORA_LIVE},
       // Media this recogniser does not know, and broken marker files: never more
-      // than "not recognised". .discinfo lines are compared as they stand, so a
-      // CR LF file names no known architecture.
+      // than "not recognised".
       {"ppc64", nullptr},
       {"unknown-release", nullptr},
-      {"discinfo-one-line", nullptr},
-      {"discinfo-crlf", nullptr},
       {"discinfo-two-lines", nullptr},
       {"discinfo-huge", "centos8-64", GUESS_VERSION_CENTOS_8_STREAM}};
   ExpectGuesses("redhat", rows);
