@@ -20,7 +20,7 @@ namespace {
 
 using tvxtest::OpenUdfBytes;
 
-// The tree a reader must find below `n`, from the builder's own spec.
+// The tree a reader must find below `n`, from what the builder was asked to write.
 tvxtest::UdfTree Expected(const UdfNodeSpec &n, const std::string &path = "", tvxtest::UdfTree t = {}) {
   for (const UdfNodeSpec &c : n.children) {
     std::string p = path.empty() ? c.name : path + "/" + c.name;
