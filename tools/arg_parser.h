@@ -36,9 +36,6 @@ class ArgParser {
   // in `positional`; else the exit status to end with.
   int Parse(const std::vector<std::string> &args, std::vector<std::string> *positional = nullptr);
 
-  // Usage reports a usage error of this command.
-  int Usage(const std::string &message) const;
-
  private:
   struct Option {
     std::string name;
@@ -46,6 +43,7 @@ class ArgParser {
     Take take;
   };
   const Option *Find(const std::string &name) const;
+  int Usage(const std::string &message) const;
 
   const char *cmd_;
   std::function<void()> help_;
